@@ -1,0 +1,21 @@
+// Property-list files, read and written whole through the safe open. Any thread may call everything here.
+#pragma once
+
+#include "platform/property/value.h"
+
+namespace quorvel {
+
+/// Writes `value` to `path` in the binary encoding, in place; a new file has mode 0644, an existing one keeps its own.
+/// Returns 0, or -1 after logging why; the file may then hold part of the value.
+[[nodiscard]] int store_dict(const char* path, const PropertyValue& value) noexcept;
+
+/// `store_dict`, with the content brought to stable storage before it returns 0.
+[[nodiscard]] int store_dict_durably(const char* path, const PropertyValue& value) noexcept;
+
+/// Reads the file at `path`. Returns the value, of whatever kind the file holds: with nothing in it that accepts
+/// changes when `immutable`, else with mutable containers. None after logging why.
+[[nodiscard]] PropertyValue _load_dict(const char* path, bool immutable) noexcept;
+[[nodiscard]] PropertyValue load_dict(const char* path) noexcept;
+[[nodiscard]] PropertyValue load_mutable_dict(const char* path) noexcept;
+
+}  // namespace quorvel

@@ -1,0 +1,9 @@
+#pragma once
+
+namespace quorvel {
+
+/// Settles `extended_logging`: on for an internal release type, or where the preference "ExtLogging" holds an integer,
+/// whichever; off otherwise. Start-up, once, before any other thread runs.
+void setup_extended_logging() noexcept;
+
+}  // namespace quorvel

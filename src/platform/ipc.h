@@ -1,0 +1,72 @@
+// The IPC service: a listener registered under a service name, whose connections export an object under an interface.
+// Accept callbacks and operations run on the service's own threads, several at once.
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string_view>
+
+#include "platform/property/value.h"
+
+namespace quorvel::platform {
+
+/// What went wrong with a call, as its client is told.
+struct IpcError {
+  std::int32_t code;
+  std::string_view description;
+};
+
+class IpcConnection;
+class IpcListener;
+
+/// The client's way to be answered. Empty when the client wants no reply. Ends unanswered if it is never sent.
+class IpcReply {
+ public:
+  explicit IpcReply(IpcConnection* connection = nullptr, std::uint64_t serial = 0) noexcept
+      : connection_(connection), serial_(serial) {}
+  IpcReply(IpcReply&& other) noexcept
+      : connection_(std::exchange(other.connection_, nullptr)), serial_(other.serial_) {}
+  IpcReply& operator=(IpcReply&&) = delete;
+  [[nodiscard]] explicit operator bool() const noexcept { return connection_ != nullptr; }
+  /// Sends a value (or none) and an error (or null); further calls do nothing. A reply that memory does not suffice
+  /// for closes the connection. On the thread that runs the operation.
+  void send(const PropertyValue& value, const IpcError* error) noexcept;
+
+ private:
+  IpcConnection* connection_;
+  std::uint64_t serial_;
+};
+
+/// One operation of an interface. `invoke` is given the exported object, the call's argument (none when it has none)
+/// and the reply.
+struct IpcOperation {
+  std::string_view name;
+  void (*invoke)(void* object, const PropertyValue& argument, IpcReply reply) noexcept;
+};
+
+struct IpcInterface {
+  std::string_view name;
+  std::span<const IpcOperation> operations;
+};
+
+/// What a delegate does with a connection it accepts. The connection belongs to the service.
+void set_exported_interface(IpcConnection* connection, const IpcInterface* interface) noexcept;
+void set_exported_object(IpcConnection* connection, void* object) noexcept;
+void resume(IpcConnection* connection) noexcept;
+
+struct IpcDelegate {
+  void* object;
+  /// Called for each new connection; the connection is closed when it returns false or has not resumed it.
+  bool (*accept)(void* object, IpcListener* listener, IpcConnection* connection) noexcept;
+};
+
+/// A listener for a service name, or null when memory runs out. The caller owns it and gives it back with
+/// `release_listener`, which stops its threads and closes its connections. Main thread.
+[[nodiscard]] IpcListener* create_listener(std::string_view service_name) noexcept;
+void set_delegate(IpcListener* listener, IpcDelegate delegate) noexcept;
+/// Starts accepting. Returns 0; or after one line on standard error the exit status to end with: 69 when a live
+/// process holds the service's socket, 71 when the socket or the threads cannot be had.
+[[nodiscard]] int resume(IpcListener* listener) noexcept;
+void release_listener(IpcListener* listener) noexcept;
+
+}  // namespace quorvel::platform

@@ -1,0 +1,382 @@
+// Reading happens in two passes over the objects. The first goes through the offset table in order, checks every object
+// and makes every leaf; the second makes the containers from the top object down, children before their parents, with a
+// stack of fixed size. Nothing is allocated for a number that the file merely claims.
+
+#include <algorithm>
+#include <bit>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+
+#include "platform/property/binary.h"
+#include "platform/property/binary_format.h"
+#include "platform/property/leaf_allocator.h"
+#include "platform/property/unicode.h"
+#include "platform/property/walk.h"
+
+namespace quorvel {
+
+namespace format = binary_format;
+using namespace detail;
+
+namespace {
+
+// What stands for a container that is not made yet, or being made. Never retained, never handed out.
+constexpr Word kUnmade = 5;
+constexpr Word kInTheMaking = 5 | 8;
+
+struct Object {
+  std::uint8_t kind;    // the marker's high four bits
+  std::uint8_t nibble;  // its low four
+  std::uint64_t size;   // elements of a text, data or container
+  const std::byte* body;
+  const std::byte* end;
+};
+
+struct Layout {
+  std::size_t offset_size;
+  std::size_t reference_size;
+  std::uint64_t count;
+  std::uint64_t top;
+  std::uint64_t table;
+};
+
+class Reader {
+ public:
+  Reader(std::span<const std::byte> bytes, Mutability mutability) noexcept
+      : bytes_(bytes), container_flags_(mutability == Mutability::mutable_containers ? std::uint8_t{kMutable} : 0) {}
+  ~Reader();
+  Reader(const Reader&) = delete;
+  Reader& operator=(const Reader&) = delete;
+
+  [[nodiscard]] PropertyValue read() noexcept;
+
+ private:
+  struct Frame {
+    std::size_t object;
+    std::uint64_t next;  // reference to look at
+  };
+
+  bool read_trailer() noexcept;
+  bool parse_object(std::uint64_t offset, Object& object) const noexcept;
+  bool parse_size(const std::byte* marker, Object& object) const noexcept;
+  std::uint64_t offset_of(std::size_t index) const noexcept {
+    return format::get_integer(bytes_.data() + layout_.table + index * layout_.offset_size, layout_.offset_size);
+  }
+
+  bool make_leaves() noexcept;
+  bool make_leaf(const Object& object, Word& word) noexcept;
+  bool make_integer(const Object& object, Word& word) noexcept;
+  bool make_text(const Object& object, Word& word) noexcept;
+  bool objects_overlap() const noexcept;
+
+  bool make_containers() noexcept;
+  bool visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept;
+  bool make_container(const Object& object, Word& word) noexcept;
+  bool make_dictionary(const Object& object, Word& word) noexcept;
+  bool take_reference(const std::byte* at, Word& word) const noexcept;
+  void count_container(Word word) noexcept { container_references_ += kind_of(word) >= PropertyKind::array ? 1 : 0; }
+  // Each container but the top one is made for its first reference: when there are more, a walk meets some again.
+  [[nodiscard]] bool shares_containers() const noexcept { return container_references_ + 1 > containers_; }
+
+  std::span<const std::byte> bytes_;
+  std::uint8_t container_flags_;
+  Layout layout_{};
+  const std::byte* objects_end_ = nullptr;
+  LeafAllocator leaves_;
+  Word* words_ = nullptr;
+  std::uint64_t containers_ = 0;
+  std::uint64_t container_references_ = 0;
+};
+
+Reader::~Reader() {
+  if (words_ == nullptr) return;
+  for (std::uint64_t i = 0; i < layout_.count; ++i) {
+    if (is_node(words_[i]) && (node_of(words_[i])->flags & kInBlock) == 0) release(words_[i]);
+  }
+  std::free(words_);
+}
+
+PropertyValue Reader::read() noexcept {
+  if (!read_trailer()) return nullptr;
+  words_ = static_cast<Word*>(std::calloc(layout_.count, sizeof(Word)));
+  if (words_ == nullptr) return nullptr;
+  leaves_.start(bytes_.size());
+  if (!make_leaves() || !make_containers()) return nullptr;
+  retain(words_[layout_.top]);
+  PropertyValue value = PropertyValue::adopt(words_[layout_.top]);
+  if (shares_containers() && !is_within_limits(value)) return nullptr;
+  return value;
+}
+
+bool Reader::read_trailer() noexcept {
+  if (bytes_.size() < format::kSmallestFile) return false;
+  if (std::memcmp(bytes_.data(), format::kHeader.data(), format::kHeader.size()) != 0) return false;
+  const std::uint64_t trailer_offset = bytes_.size() - format::kTrailerSize;
+  const std::byte* trailer = bytes_.data() + trailer_offset;
+  layout_.offset_size = static_cast<std::size_t>(trailer[format::kOffsetSizeAt]);
+  layout_.reference_size = static_cast<std::size_t>(trailer[format::kReferenceSizeAt]);
+  layout_.count = format::get_integer(trailer + format::kObjectCountAt, 8);
+  layout_.top = format::get_integer(trailer + format::kTopObjectAt, 8);
+  layout_.table = format::get_integer(trailer + format::kTableOffsetAt, 8);
+  const auto is_width = [](std::size_t width) { return width >= 1 && width <= 8; };
+  if (!is_width(layout_.offset_size) || !is_width(layout_.reference_size)) return false;
+  if (layout_.table <= format::kHeader.size() || layout_.table >= trailer_offset) return false;
+  if (layout_.count == 0 || layout_.count > (trailer_offset - layout_.table) / layout_.offset_size) return false;
+  objects_end_ = bytes_.data() + layout_.table;
+  return layout_.top < layout_.count;
+}
+
+// The size in a marker's nibble, or in the integer object behind it.
+bool Reader::parse_size(const std::byte* marker, Object& object) const noexcept {
+  object.body = marker + 1;
+  object.size = object.nibble;
+  if (object.nibble != format::kLongSize) return true;
+  if (object.body == objects_end_) return false;
+  const auto integer = static_cast<std::uint8_t>(*object.body++);
+  if (integer >> 4 != format::kInteger || (integer & 15) > 3) return false;
+  const std::size_t width = std::size_t{1} << (integer & 15);
+  if (static_cast<std::size_t>(objects_end_ - object.body) < width) return false;
+  object.size = format::get_integer(object.body, width);
+  object.body += width;
+  return width < 8 || object.size >> 63 == 0;
+}
+
+bool Reader::parse_object(std::uint64_t offset, Object& object) const noexcept {
+  if (offset < format::kHeader.size() || offset >= layout_.table) return false;
+  const std::byte* marker = bytes_.data() + offset;
+  object.kind = static_cast<std::uint8_t>(*marker) >> 4;
+  object.nibble = static_cast<std::uint8_t>(*marker) & 15;
+  std::size_t unit = 1;
+  object.body = marker + 1;
+  switch (object.kind) {
+    case format::kFalse >> 4:
+      object.size = 0;
+      if (object.nibble != (format::kFalse & 15) && object.nibble != (format::kTrue & 15)) return false;
+      break;
+    case format::kInteger:
+      if (object.nibble > 4) return false;
+      object.size = std::uint64_t{1} << object.nibble;
+      break;
+    case format::kReal:
+      if (object.nibble != 2 && object.nibble != 3) return false;
+      object.size = std::uint64_t{1} << object.nibble;
+      break;
+    case format::kDate >> 4:
+      if (object.nibble != (format::kDate & 15)) return false;
+      object.size = 8;
+      break;
+    case format::kUtf16Text:
+    case format::kData:
+    case format::kAsciiText:
+    case format::kArray:
+    case format::kDictionary:
+      if (!parse_size(marker, object)) return false;
+      if (object.kind == format::kUtf16Text) unit = 2;
+      if (object.kind == format::kArray) unit = layout_.reference_size;
+      if (object.kind == format::kDictionary) unit = 2 * layout_.reference_size;
+      break;
+    default: return false;
+  }
+  if (object.size > static_cast<std::uint64_t>(objects_end_ - object.body) / unit) return false;
+  object.end = object.body + object.size * unit;
+  return true;
+}
+
+// Two objects that share bytes would let a small file stand for large values.
+bool Reader::objects_overlap() const noexcept {
+  struct Extent {
+    std::uint64_t begin;
+    std::uint64_t end;
+  };
+  const std::unique_ptr<Extent, decltype(&std::free)> extents(
+      static_cast<Extent*>(std::malloc(layout_.count * sizeof(Extent))), &std::free);
+  if (extents == nullptr) return true;
+  Extent* const first = extents.get();
+  for (std::size_t i = 0; i < layout_.count; ++i) {
+    Object object;
+    const std::uint64_t offset = offset_of(i);
+    if (!parse_object(offset, object)) return true;
+    first[i] = {offset, static_cast<std::uint64_t>(object.end - bytes_.data())};
+  }
+  std::sort(first, first + layout_.count, [](const Extent& a, const Extent& b) { return a.begin < b.begin; });
+  for (std::size_t i = 1; i < layout_.count; ++i) {
+    if (first[i].begin < first[i - 1].end) return true;
+  }
+  return false;
+}
+
+bool Reader::make_leaves() noexcept {
+  bool may_overlap = true;  // until it is known that nothing does
+  std::uint64_t end = 0;
+  for (std::size_t i = 0; i < layout_.count; ++i) {
+    Object object;
+    const std::uint64_t offset = offset_of(i);
+    if (!parse_object(offset, object)) return false;
+    // Objects that stand in the order of their numbers are compared one by one; the first that does not has all of
+    // them compared, before a leaf is made of it.
+    if (may_overlap && offset < end) {
+      if (objects_overlap()) return false;
+      may_overlap = false;
+    }
+    end = static_cast<std::uint64_t>(object.end - bytes_.data());
+    if (object.kind == format::kArray || object.kind == format::kDictionary) {
+      words_[i] = kUnmade;
+    } else if (!make_leaf(object, words_[i])) {
+      return false;
+    }
+  }
+  return true;
+}
+
+bool Reader::make_integer(const Object& object, Word& word) noexcept {
+  std::uint64_t value = 0;
+  bool is_unsigned = object.size < 8;
+  if (object.size <= 8) {
+    value = format::get_integer(object.body, object.size);
+  } else {
+    const std::uint64_t high = format::get_integer(object.body, 8);
+    value = format::get_integer(object.body + 8, 8);
+    is_unsigned = high == 0;
+    if (!is_unsigned && (high != UINT64_MAX || value >> 63 == 0)) return false;
+  }
+  if (!is_unsigned || value >> 63 == 0) {
+    const auto number = static_cast<std::int64_t>(value);
+    if (number >= kImmediateMinimum && number <= kImmediateMaximum) {
+      word = immediate_integer(number);
+      return true;
+    }
+  }
+  const bool is_large = is_unsigned && value >> 63 != 0;
+  word = leaves_.add_number(PropertyKind::integer, value, is_large ? std::uint8_t{kUnsigned} : 0);
+  return word != 0;
+}
+
+bool Reader::make_text(const Object& object, Word& word) noexcept {
+  if (object.kind == format::kUtf16Text) {
+    const std::size_t length = utf8_length_of_utf16(object.body, object.size);
+    if (length == SIZE_MAX) return false;
+    // A text that ASCII could have held is marked as what it is, so that it is written as such.
+    BytesNode* node = leaves_.add_bytes(PropertyKind::string, length, length == object.size ? std::uint8_t{kAscii} : 0);
+    if (node == nullptr) return false;
+    write_utf8(object.body, object.size, node->bytes());
+    word = word_of(node);
+    return true;
+  }
+  const std::string_view text(reinterpret_cast<const char*>(object.body), object.size);
+  const bool is_text = object.kind == format::kAsciiText;
+  if (is_text && !is_ascii(text)) return false;
+  BytesNode* node = leaves_.add_bytes(is_text ? PropertyKind::string : PropertyKind::data, text.size(),
+                                      is_text ? std::uint8_t{kAscii} : 0);
+  if (node == nullptr) return false;
+  if (!text.empty()) std::memcpy(node->bytes(), text.data(), text.size());
+  word = word_of(node);
+  return true;
+}
+
+bool Reader::make_leaf(const Object& object, Word& word) noexcept {
+  switch (object.kind) {
+    case format::kFalse >> 4: word = object.nibble == (format::kTrue & 15) ? kTrue : kFalse; return true;
+    case format::kInteger: return make_integer(object, word);
+    case format::kReal:
+    case format::kDate >> 4: {
+      std::uint64_t bits = format::get_integer(object.body, object.size);
+      if (object.size == 4) {
+        bits = std::bit_cast<std::uint64_t>(double{std::bit_cast<float>(static_cast<std::uint32_t>(bits))});
+      }
+      word = leaves_.add_number(object.kind == format::kReal ? PropertyKind::real : PropertyKind::date, bits, 0);
+      return word != 0;
+    }
+    default: return make_text(object, word);
+  }
+}
+
+bool Reader::take_reference(const std::byte* at, Word& word) const noexcept {
+  const std::uint64_t index = format::get_integer(at, layout_.reference_size);
+  if (index >= layout_.count) return false;
+  word = words_[index];
+  return true;
+}
+
+// Puts the next child that must be made first on the stack; without one, makes the container on top of it.
+bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept {
+  Object object;
+  if (!parse_object(offset_of(frame.object), object)) return false;
+  const std::uint64_t references = object.size * (object.kind == format::kDictionary ? 2 : 1);
+  for (; frame.next < references; ++frame.next) {
+    const std::byte* at = object.body + frame.next * layout_.reference_size;
+    Word word = 0;
+    if (!take_reference(at, word) || word == kInTheMaking) return false;
+    if (word == kUnmade) {
+      if (depth == kMaximumDepth) return false;
+      stack[depth++] = {static_cast<std::size_t>(format::get_integer(at, layout_.reference_size)), 0};
+      words_[stack[depth - 1].object] = kInTheMaking;
+      return true;
+    }
+  }
+  --depth;
+  return make_container(object, words_[frame.object]);
+}
+
+bool Reader::make_containers() noexcept {
+  if (words_[layout_.top] != kUnmade) return true;
+  Frame stack[kMaximumDepth];
+  std::size_t depth = 1;
+  stack[0] = {static_cast<std::size_t>(layout_.top), 0};
+  words_[layout_.top] = kInTheMaking;
+  while (depth > 0) {
+    if (!visit_children(stack[depth - 1], stack, depth)) return false;
+  }
+  return true;
+}
+
+bool Reader::make_container(const Object& object, Word& word) noexcept {
+  ++containers_;
+  if (object.kind == format::kDictionary) return make_dictionary(object, word);
+  ArrayNode* array = new_array(object.size, container_flags_);
+  if (array == nullptr) return false;
+  word = word_of(array);
+  for (std::uint64_t i = 0; i < object.size; ++i) {
+    Word item = 0;
+    if (!take_reference(object.body + i * layout_.reference_size, item)) return false;
+    count_container(item);
+    array->items()[i] = item;
+  }
+  retain_all(array->items(), object.size);
+  array->used = array->capacity;
+  return true;
+}
+
+bool Reader::make_dictionary(const Object& object, Word& word) noexcept {
+  DictionaryNode* dictionary = new_dictionary(object.size, container_flags_);
+  if (dictionary == nullptr) return false;
+  word = word_of(dictionary);
+  Entry* const entries = dictionary->entries();
+  const std::byte* at = object.body;
+  const std::byte* values = object.body + object.size * layout_.reference_size;
+  std::string_view before;
+  bool sorted = true;
+  for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size, values += layout_.reference_size) {
+    Word key = 0, value = 0;
+    if (!take_reference(at, key) || !take_reference(values, value)) return false;
+    if (kind_of(key) != PropertyKind::string) return false;
+    count_container(value);
+    entries[i] = {key, value};
+    sorted = sorted && (i == 0 || before < text_of(key));
+    before = text_of(key);
+  }
+  retain_all(&entries->key, object.size * 2);
+  dictionary->used = dictionary->live = dictionary->capacity;
+  if (!sorted) dictionary->flags = static_cast<std::uint8_t>(dictionary->flags & ~kSorted);
+  // Keys in ascending order are known to differ.
+  return index_entries(*dictionary, !sorted);
+}
+
+}  // namespace
+
+PropertyValue read_binary(std::span<const std::byte> bytes, Mutability mutability) noexcept {
+  Reader reader(bytes, mutability);
+  return reader.read();
+}
+
+}  // namespace quorvel

@@ -1,0 +1,36 @@
+// Which leaves a writer has numbered already, so that each distinct leaf is written once.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+
+#include "platform/property/node.h"
+
+namespace quorvel::detail {
+
+class LeafTable {
+ public:
+  enum class Outcome { added, found, no_memory };
+
+  LeafTable() noexcept = default;
+  LeafTable(const LeafTable&) = delete;
+  LeafTable& operator=(const LeafTable&) = delete;
+  ~LeafTable() { std::free(slots_); }
+
+  /// Makes room for `more` leaves, so that they are taken in without moving the others. False when memory runs out.
+  [[nodiscard]] bool reserve(std::size_t more) noexcept;
+
+  /// Looks up a leaf equal to `leaf` and sets `number` to its number; when there is none, takes `leaf` in under
+  /// `number`. `objects` are the numbered leaves.
+  [[nodiscard]] Outcome find_or_add(Word leaf, const Word* objects, std::uint32_t& number) noexcept;
+
+ private:
+  [[nodiscard]] bool resize(std::size_t size) noexcept;
+
+  IndexSlot* slots_ = nullptr;
+  std::size_t size_ = 0;
+  std::size_t used_ = 0;
+};
+
+}  // namespace quorvel::detail

@@ -1,0 +1,14 @@
+// Which socket stands for which service, as seen from the device root.
+#pragma once
+
+#include <string_view>
+
+namespace quorvel::wire {
+
+inline constexpr std::string_view kServiceDirectory = "/run/quorvel";
+/// A service's socket is named after the service, with this suffix.
+inline constexpr std::string_view kSocketSuffix = ".sock";
+inline constexpr std::string_view kNotificationSocket = "notifications.sock";
+inline constexpr std::string_view kTelephonySocket = "telvane.sock";
+
+}  // namespace quorvel::wire

@@ -1,0 +1,119 @@
+#include "store/data_ark_file.h"
+
+#include <string.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <new>
+
+#include "files/error_text.h"
+#include "files/property_list_file.h"
+#include "files/value_helpers.h"
+#include "log/daemon_log.h"
+#include "store/data_ark.h"
+#include "store/data_ark_record.h"
+
+namespace quorvel {
+
+namespace {
+
+void compose(char (&path)[platform::kPathSize], const char* head, const char* tail) noexcept {
+  // The fixed paths come nowhere near the bound.
+  static_cast<void>(std::snprintf(path, sizeof path, "%.500s%s", head, tail));
+}
+
+// Only an error that says so means that no file is there.
+bool file_is_there(const char* path) noexcept {
+  struct stat status {};
+  return platform::file_status(path, &status) == 0 || (errno != ENOENT && errno != ENOTDIR);
+}
+
+// The entries that a save writes; none when memory runs out.
+PropertyValue copy_saved_entries(const DataArk& ark) noexcept QUORVEL_REQUIRES(ark.lock) {
+  PropertyValue saved = PropertyValue::dictionary(ark.values.size());
+  if (!saved) return nullptr;
+  for (const auto& [key, value] : ark.values.entries()) {
+    if (!ark.is_unsaved(key.text()) && !saved.set(key, value)) return nullptr;
+  }
+  return saved;
+}
+
+// Moves a file that could not be loaded out of the way of the one that replaces it.
+bool set_aside(DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRES(ark.lock) {
+  if (platform::rename_file(paths.file, paths.set_aside) != 0 && errno != ENOENT) {
+    daemon_log(0, "data_ark_store", "Could not set %s aside as %s: %s", paths.file, paths.set_aside,
+               ErrorText().text());
+    return false;
+  }
+  daemon_log(0, "data_ark_store", "%s could not be loaded, set it aside as %s", paths.file, paths.set_aside);
+  ark.file_is_unreadable = false;
+  return true;
+}
+
+void remove_data_file(const DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRES(ark.lock) {
+  if (ark.file_is_unreadable) {
+    daemon_log(0, "data_ark_store", "%s could not be loaded, left it where it is", paths.file);
+  } else {
+    platform::remove_file(paths.file);
+  }
+}
+
+void replace_data_file(DataArk& ark, const DataArkPaths& paths, const PropertyValue& entries) noexcept
+    QUORVEL_REQUIRES(ark.lock) {
+  if (store_dict_durably(paths.temporary, entries) != 0) {
+    daemon_log(0, "data_ark_store", "Could not store %s", paths.temporary);
+    return;
+  }
+  if (ark.file_is_unreadable && !set_aside(ark, paths)) return;
+  if (platform::rename_file(paths.temporary, paths.file) != 0) {
+    daemon_log(0, "data_ark_store", "Problem renaming %s: %s", paths.temporary, ErrorText().text());
+    return;
+  }
+  if (platform::flush_directory(paths.directory) != 0) {
+    daemon_log(0, "data_ark_store", "Could not store %s", paths.file);
+    return;
+  }
+  if (extended_logging != 0) daemon_log(0, "data_ark_store", "saved");
+}
+
+}  // namespace
+
+DataArkPaths::DataArkPaths() noexcept {
+  char home[platform::kPathSize];
+  mobile_home_path(home);
+  compose(directory, home, "/Library/qvd");
+  compose(file, directory, "/data_ark.plist");
+  compose(temporary, file, ".XXXXXX");
+  compose(set_aside, file, ".unreadable");
+}
+
+DataArk* data_ark_load() noexcept {
+  auto* ark = new (std::nothrow) DataArk;
+  if (ark == nullptr) return nullptr;
+  const DataArkPaths paths;
+  PropertyValue loaded = load_mutable_dict(paths.file);
+  const LockHold hold(ark->lock);
+  if (loaded.is_dictionary()) {
+    ark->values = std::move(loaded);
+  } else {
+    ark->file_is_unreadable = loaded || file_is_there(paths.file);
+    daemon_log(0, "data_ark_load", "Could not load %s", paths.file);
+  }
+  return ark;
+}
+
+void data_ark_store(DataArk* ark) noexcept {
+  const DataArkPaths paths;
+  const LockHold hold(ark->lock);
+  const PropertyValue entries = copy_saved_entries(*ark);
+  if (!entries) {
+    daemon_log(0, "data_ark_store", "Nothing mutable changed!");
+  } else if (entries.size() == 0) {
+    remove_data_file(*ark, paths);
+  } else {
+    replace_data_file(*ark, paths, entries);
+  }
+  ark->change_count = 0;
+}
+
+}  // namespace quorvel

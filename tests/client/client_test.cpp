@@ -1,0 +1,183 @@
+// The client library against services that misbehave, and the errors it reports.
+#include "quorvel/client.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+
+#include <cstdio>
+#include <functional>
+#include <future>
+#include <thread>
+
+#include "platform/descriptor.h"
+#include "platform/wire/frame.h"
+#include "protocol/quorvel_protocol.h"
+#include "quorvel/observer.h"
+#include "support/descriptors.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::client {
+namespace {
+
+using namespace std::chrono_literals;
+using namespace quorvel::test;
+
+const std::string kSocket = "/run/quorvel/com.Orvane.quorveld.sock";
+const std::string kObserved = "/run/quorvel/notifications.sock";
+
+std::string frame(wire::FrameKind kind, std::uint64_t serial, std::string_view name, const PropertyValue& value) {
+  ByteBuffer bytes;
+  EXPECT_TRUE(wire::append_frame(kind, 0, serial, name, value, bytes));
+  return {reinterpret_cast<const char*>(bytes.data()), bytes.size()};
+}
+
+// A service that takes one connection, sends what it is told to in pieces, and keeps the connection open if asked.
+class Service {
+ public:
+  Service(const ScratchRoot& root, const std::string& path, std::vector<std::string> pieces, bool hold)
+      : listener_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    const std::string file = root.path(path);
+    const std::filesystem::path directory = std::filesystem::path(file).parent_path();
+    const Descriptor run(::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::snprintf(address.sun_path, sizeof address.sun_path, "/proc/self/fd/%d/%s", run.get(),
+                  std::filesystem::path(file).filename().c_str());
+    if (::bind(listener_.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
+        ::listen(listener_.get(), 1) != 0) {
+      throw std::runtime_error("the service cannot listen");
+    }
+    thread_ = std::thread([this, sent = std::move(pieces), hold] {
+      const Descriptor connection(::accept(listener_.get(), nullptr, nullptr));
+      for (const std::string& piece : sent) {
+        ::send(connection.get(), piece.data(), piece.size(), MSG_NOSIGNAL);
+        std::this_thread::sleep_for(2ms);
+      }
+      char byte;
+      while (hold && ::recv(connection.get(), &byte, 1, 0) > 0) {
+      }
+    });
+  }
+  ~Service() { thread_.join(); }
+
+ private:
+  Descriptor listener_;
+  std::thread thread_;
+};
+
+class ClientTest : public testing::Test {
+ protected:
+  // A root whose path is far longer than a socket address.
+  ScratchRoot root{std::string(150, 'a') + "/" + std::string(150, 'b')};
+};
+
+TEST_F(ClientTest, TellsHowAServiceMisbehaves) {
+  using Kind = wire::FrameKind;
+  const std::string reply = frame(Kind::reply, 1, "", text("answer"));
+  const std::string state = frame(Kind::state, 0, "", dictionary({}));
+  std::vector<std::string> trickle;
+  for (const char byte : state + reply) trickle.emplace_back(1, byte);
+  struct Case {
+    const char* what;
+    std::vector<std::string> pieces;
+    bool hold;
+    std::optional<ErrorCode> error;
+  };
+  const Case cases[] = {
+      {"a byte at a time, other frames first", trickle, true, std::nullopt},
+      {"closes at once", {}, false, ErrorCode::disconnected},
+      {"closes within the reply", {reply.substr(0, reply.size() - 1)}, false, ErrorCode::disconnected},
+      {"says nothing", {}, true, ErrorCode::timed_out},
+      {"stops within the reply", {reply.substr(0, 20)}, true, ErrorCode::timed_out},
+      {"answers another call", {frame(Kind::reply, 2, "", text("x"))}, true, ErrorCode::timed_out},
+      {"announces more than the limit",
+       {std::string("\x7f\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1", 16)},
+       true,
+       ErrorCode::protocol_error},
+      {"sends garbage", {std::string(64, '\xff')}, true, ErrorCode::protocol_error},
+      {"replies with no property list",
+       {std::string("\0\0\0\4\2\0\0\0\0\0\0\0\0\0\0\1nope", 20)},
+       true,
+       ErrorCode::protocol_error},
+      {"fails",
+       {frame(Kind::failure, 1, "", dictionary({{"Code", 7}, {"Description", "busy"}}))},
+       true,
+       ErrorCode::service_failure},
+      {"fails oddly", {frame(Kind::failure, 1, "", array({1}))}, true, ErrorCode::service_failure},
+  };
+  const std::size_t before = descriptors_open();
+  for (const Case& test : cases) {
+    {
+      Service service(root, kSocket, test.pieces, test.hold);
+      Options options;
+      options.timeout = test.error == ErrorCode::timed_out ? 100ms : 20s;
+      const Reply answer = Client(options).copy_regulatory_images();
+      EXPECT_EQ(answer.error ? std::optional(answer.error->code) : std::nullopt, test.error) << test.what;
+      EXPECT_TRUE(!answer.error || !answer.error->description.empty()) << test.what;
+      if (test.error == ErrorCode::service_failure && answer.error->service_code != 0) {
+        EXPECT_EQ(answer.error->description, "busy");
+        EXPECT_EQ(answer.error->service_code, 7);
+      }
+    }
+    root.remove(kSocket);
+  }
+  EXPECT_EQ(descriptors_open(), before);
+}
+
+TEST_F(ClientTest, TellsWhyThereIsNoService) {
+  const auto error_of = [](const Options& options) {
+    const Reply reply = Client(options).call("operation");
+    return reply.error ? std::optional(reply.error->code) : std::nullopt;
+  };
+  EXPECT_EQ(error_of({}), ErrorCode::service_absent);
+  root.write_file(kSocket, "no socket");
+  EXPECT_EQ(error_of({}), ErrorCode::service_absent);
+  EXPECT_EQ(error_of({.root = "relative"}), ErrorCode::invalid_root);
+  EXPECT_EQ(error_of({.root = root.path("/nowhere")}), ErrorCode::invalid_root);
+  EXPECT_EQ(error_of({.service = "../telvane"}), ErrorCode::invalid_argument);
+  EXPECT_EQ(error_of({.service = std::string(200, 'x')}), ErrorCode::invalid_argument);
+  EXPECT_EQ(Client().call(std::string(300, 'x')).error->code, ErrorCode::invalid_argument);
+  root.remove("/run");
+  EXPECT_EQ(error_of({}), ErrorCode::service_absent);
+}
+
+TEST_F(ClientTest, CompletesOnceOnAThreadOfItsOwn) {
+  Service service(root, kSocket, {frame(wire::FrameKind::reply, 1, "", text("answer"))}, false);
+  std::promise<std::pair<std::thread::id, std::string>> completed;
+  {
+    const PendingCall call = Client().copy_regulatory_images([&completed](const Reply& reply) {
+      completed.set_value({std::this_thread::get_id(), std::string(reply.value.text())});
+    });
+  }
+  const auto [thread, value] = completed.get_future().get();
+  EXPECT_NE(thread, std::this_thread::get_id());
+  EXPECT_EQ(value, "answer");
+}
+
+TEST_F(ClientTest, ObservesNotificationsAndWhatItMissed) {
+  using Kind = wire::FrameKind;
+  Service service(root, kObserved,
+                  {frame(Kind::ready, 41, "", {}), frame(Kind::notification, 42, "changed", text("changed")),
+                   frame(Kind::missed, 50, "", PropertyValue::integer(8)), frame(Kind::reply, 1, "", {})},
+                  true);
+  Observer observer;
+  ASSERT_FALSE(observer.connect());
+  EXPECT_EQ(observer.first_sequence(), 41u);
+  Event event;
+  ASSERT_FALSE(observer.next(event, 20s));
+  EXPECT_EQ(event.sequence, 42u);
+  EXPECT_EQ(event.name, "changed");
+  EXPECT_EQ(event.object, text("changed"));
+  ASSERT_FALSE(observer.next(event, 20s));
+  EXPECT_EQ(event.sequence, 50u);
+  EXPECT_EQ(event.missed, 8u);
+  EXPECT_EQ(observer.next(event, 20s)->code, ErrorCode::protocol_error);
+  EXPECT_EQ(observer.next(event, 20s)->code, ErrorCode::disconnected);
+}
+
+}  // namespace
+}  // namespace quorvel::client

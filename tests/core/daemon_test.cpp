@@ -1,0 +1,194 @@
+// The daemon as it is installed: start-up, the state directory, the operation, and the end.
+#include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "platform/descriptor.h"
+#include "platform/wire/frame.h"
+#include "protocol/quorvel_protocol.h"
+#include "quorvel/client.h"
+#include "support/program.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+const std::string kImages = std::string(kStateDirectory) + "/regulatory_images/regulatory_images.plist";
+const std::string kBanner = "main: ____________________ Quorvel startup _____________________";
+const std::string kNoTelephony = "registerForTelvaneCallNotifications: Could not get the Telvane phone center";
+
+class Daemon : public testing::Test {
+ protected:
+  Daemon() {
+    ::umask(022);
+    root.set_mode("/private/var/mobile/Library", 0755);
+  }
+
+  static std::string info(const std::string& path, const std::string& mode) {
+    return "log_file_info: stat " + path + " uid=" + std::to_string(::getuid()) + " gid=" + std::to_string(::getgid()) +
+           " p=" + mode;
+  }
+
+  // The lines of a load of the file at `path`, which cannot be opened, and whose directory is as `directory` says.
+  static std::vector<std::string> unopened(const std::string& path, const std::string& error,
+                                           const std::string& directory) {
+    return {"_safe_open: open(" + path + ") failed: " + error, "_load_dict: Could not open " + path + ": " + error,
+            "log_file_info: Can't stat " + path + ": " + error, directory};
+  }
+
+  // What one start logs after its banner.
+  std::vector<std::string> start_and_stop() {
+    Program daemon(daemon_program());
+    EXPECT_TRUE(daemon.wait_until_ready());
+    EXPECT_EQ(daemon.stop().status, 0);
+    std::vector<std::string> lines = root.log_lines();
+    EXPECT_EQ(lines.empty() ? "" : lines.front(), kBanner);
+    if (!lines.empty()) lines.erase(lines.begin());
+    return lines;
+  }
+
+  // One start's first lines after the banner.
+  void expect_start(const std::vector<std::string>& expected) {
+    std::vector<std::string> lines = start_and_stop();
+    lines.resize(std::min(lines.size(), expected.size()));
+    EXPECT_EQ(lines, expected);
+  }
+
+  ScratchRoot root;
+};
+
+TEST_F(Daemon, StartsInOrderAndSecuresItsStateDirectory) {
+  std::vector<std::string> first_start =
+      unopened(kDataFile, "No such file or directory", info(kStateDirectory, "40700"));
+  first_start.push_back(std::string("data_ark_load: Could not load ") + kDataFile);
+  first_start.push_back(kNoTelephony);
+  EXPECT_EQ(start_and_stop(), first_start);
+  EXPECT_EQ(root.mode_of(kStateDirectory), 0700u);
+
+  root.set_mode(kStateDirectory, 0755);
+  root.write_plist(kDataFile, dictionary({{"-Kept", "value"}, {"-PhoneNumber", "5"}}));
+  EXPECT_EQ(start_and_stop(), std::vector<std::string>{kNoTelephony});
+  EXPECT_EQ(root.mode_of(kStateDirectory), 0700u);
+  EXPECT_EQ(root.read_plist(kDataFile), dictionary({{"-Kept", "value"}}));
+}
+
+TEST_F(Daemon, GoesOnWithSomethingElseInTheStateDirectorysPlace) {
+  const std::string state = kStateDirectory;
+  root.write_file(state, "not a directory");
+  expect_start({"_safe_open: " + state + " type is 32768, not 16384", "halvardstart_local: couldn't open " + state});
+  EXPECT_EQ(root.read_file(state), "not a directory");
+
+  root.remove(state);
+  root.make_directory("/elsewhere", 0755);
+  root.make_link("/elsewhere", state);
+  expect_start({"_safe_open: open(" + state + ") failed: Too many levels of symbolic links",
+                "halvardstart_local: couldn't open " + state});
+  EXPECT_EQ(root.mode_of("/elsewhere"), 0755u);
+}
+
+TEST_F(Daemon, GoesOnWithoutAStateDirectory) {
+  const std::string state = kStateDirectory;
+  const std::string missing = ": No such file or directory";
+  // The log's path leads elsewhere, so that the directories above the state's can be missing.
+  root.remove("/var");
+  root.make_directory("/var/mobile/Library/Logs");
+  root.remove("/private/var/mobile/Library");
+  expect_start({"halvardstart_local: Could not mkdir " + state + " " + missing,
+                "log_file_info: Can't stat " + state + missing,
+                "log_file_info: Can't stat /private/var/mobile/Library" + missing,
+                "_safe_open: open(" + state + ") failed" + missing, "halvardstart_local: couldn't open " + state});
+}
+
+TEST_F(Daemon, AnswersWithTheRegulatoryImages) {
+  const PropertyValue images = dictionary({{"Rest of World", data("\x89PNG")}, {"Count", 2}});
+  root.write_plist(kImages, images);
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  static_cast<void>(root.log_lines());
+  const client::Client client;
+  const auto expect_answer = [&](const PropertyValue& value, const std::vector<std::string>& log) {
+    const client::Reply reply = client.copy_regulatory_images();
+    EXPECT_FALSE(reply.error) << reply.error->description;
+    EXPECT_EQ(reply.value, value);
+    EXPECT_EQ(root.log_lines(), log);
+  };
+  std::vector<std::thread> clients;
+  for (int i = 0; i < 8; ++i) {
+    clients.emplace_back([&] {
+      for (int call = 0; call < 20; ++call) EXPECT_EQ(client::Client().copy_regulatory_images().value, images);
+    });
+  }
+  for (std::thread& thread : clients) thread.join();
+  expect_answer(images, {});
+  // Read anew for each call.
+  root.write_plist(kImages, dictionary({}));
+  expect_answer(dictionary({}), {});
+  root.write_plist(kImages, array({"images"}));
+  expect_answer({}, {std::string(protocol::kCopyRegulatoryImages) + ": " + kImages + " does not hold a dictionary"});
+  root.write_file(kImages, "garbage");
+  expect_answer({}, {"_load_dict: Could not create dictionary from stream"});
+  root.remove(kImages);
+  root.set_mode(std::string(kStateDirectory) + "/regulatory_images", 0755);
+  expect_answer({}, unopened(kImages, "No such file or directory",
+                             info(std::string(kStateDirectory) + "/regulatory_images", "40755")));
+
+  const client::Reply refused = client.call(protocol::kCopyRegulatoryImages, text("argument"));
+  ASSERT_TRUE(refused.error);
+  EXPECT_EQ(refused.error->code, client::ErrorCode::service_failure);
+  EXPECT_EQ(refused.error->service_code, protocol::kUnexpectedArgument);
+  EXPECT_EQ(daemon.stop().status, 0);
+}
+
+TEST_F(Daemon, ACallThatWantsNoReplyIsServedAndNotAnswered) {
+  root.write_file(kImages, "garbage");
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  static_cast<void>(root.log_lines());
+  const Descriptor socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  root.path("/run/quorvel/com.Orvane.quorveld.sock").string().copy(address.sun_path, sizeof address.sun_path - 1);
+  ASSERT_EQ(::connect(socket.get(), reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+  ByteBuffer calls;
+  for (const std::uint64_t serial : {std::uint64_t{1}, std::uint64_t{2}}) {
+    const std::uint8_t flags = serial == 1 ? wire::kFlagNoReply : std::uint8_t{0};
+    ASSERT_TRUE(wire::append_frame(wire::FrameKind::call, flags, serial, protocol::kCopyRegulatoryImages, {}, calls));
+  }
+  ASSERT_EQ(::send(socket.get(), calls.data(), calls.size(), MSG_NOSIGNAL), static_cast<ssize_t>(calls.size()));
+  ByteBuffer replies;
+  ASSERT_TRUE(replies.resize(64));
+  ::shutdown(socket.get(), SHUT_WR);
+  const ssize_t count = ::recv(socket.get(), replies.data(), replies.size(), MSG_WAITALL);
+  ASSERT_GE(count, 0);
+  ASSERT_TRUE(replies.resize(static_cast<std::size_t>(count)));
+  wire::Frame reply;
+  ASSERT_EQ(wire::parse_frame(replies.bytes(), 64, reply), wire::FrameResult::complete);
+  EXPECT_EQ(reply.head.serial, 2u);
+  EXPECT_EQ(replies.size(), wire::kFrameHeadSize);
+  const std::string unread = "_load_dict: Could not create dictionary from stream";
+  root.expect_log({unread, unread});
+}
+
+TEST_F(Daemon, SigintEndsItAndASecondOneIsRefused) {
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  static_cast<void>(root.log_lines());
+  EXPECT_EQ(run_to_end(daemon_program(), {}).status, 69);
+  EXPECT_TRUE(daemon.running());
+  daemon.send_signal(SIGINT);
+  const Outcome outcome = daemon.wait();
+  EXPECT_EQ(outcome.status, 0);
+  EXPECT_EQ(outcome.err, "");
+}
+
+}  // namespace
+}  // namespace quorvel::test

@@ -1,0 +1,131 @@
+#include "files/property_list_file.h"
+
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <filesystem>
+#include <string>
+
+#include "support/descriptors.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+const std::string kFolder = "/private/var/mobile";
+const std::string kFile = kFolder + "/file.plist";
+
+class PropertyListFile : public testing::Test {
+ protected:
+  PropertyListFile() {
+    ::umask(022);
+    root.set_mode(kFolder, 0755);
+  }
+
+  std::string info(const std::string& path, const std::string& mode) const {
+    return "log_file_info: stat " + path + " uid=" + std::to_string(::getuid()) + " gid=" + std::to_string(::getgid()) +
+           " p=" + mode;
+  }
+
+  ScratchRoot root;
+};
+
+PropertyValue sample() {
+  return dictionary({{"array", array({1, -2.5, true, "text"})},
+                     {"nested", dictionary({{"data", data("\1\2\3")}, {"date", PropertyValue::date(86400.25)}})},
+                     {"largest", UINT64_MAX}});
+}
+
+TEST_F(PropertyListFile, WhatIsStoredIsLoadedEqual) {
+  for (const auto store : {store_dict, store_dict_durably}) {
+    for (const PropertyValue& value : {sample(), array({"root"}), text("root"), dictionary({})}) {
+      ASSERT_EQ(store(kFile.c_str(), value), 0);
+      EXPECT_EQ(root.read_file(kFile).substr(0, 8), "bplist00");
+      EXPECT_EQ(load_dict(kFile.c_str()), value);
+      EXPECT_EQ(load_mutable_dict(kFile.c_str()), value);
+    }
+  }
+  EXPECT_EQ(root.mode_of(kFile), 0644u);
+  root.set_mode(kFile, 0600);
+  EXPECT_EQ(store_dict(kFile.c_str(), array({})), 0);
+  EXPECT_EQ(root.mode_of(kFile), 0600u);
+  EXPECT_EQ(root.read_plist(kFile), array({}));
+}
+
+TEST_F(PropertyListFile, OnlyAMutableLoadAcceptsChanges) {
+  root.write_plist(kFile, sample());
+  PropertyValue fixed = load_dict(kFile.c_str());
+  EXPECT_FALSE(fixed.set("key", text("value")));
+  EXPECT_EQ(fixed.slot("nested"), nullptr);
+  EXPECT_FALSE(fixed.get("nested").is_mutable() || fixed.get("array").is_mutable());
+
+  PropertyValue open = load_mutable_dict(kFile.c_str());
+  EXPECT_TRUE(open.set("key", text("value")));
+  ASSERT_NE(open.slot("nested"), nullptr);
+  EXPECT_TRUE(open.slot("nested")->set("key", text("value")));
+  ASSERT_NE(open.slot("array"), nullptr);
+  EXPECT_TRUE(open.slot("array")->append(text("value")));
+}
+
+TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
+  const auto unopened = [&](const std::string& refusal, const std::string& path, const std::string& mode) {
+    EXPECT_FALSE(load_dict(path.c_str()));
+    const std::vector<std::string> lines = root.log_lines();
+    ASSERT_EQ(lines.size(), 4u);
+    EXPECT_EQ(lines[0], "_safe_open: " + refusal);
+    EXPECT_TRUE(lines[1].starts_with("_load_dict: Could not open " + path + ": ")) << lines[1];
+    EXPECT_EQ(lines[2],
+              mode.empty() ? "log_file_info: Can't stat " + path + ": No such file or directory" : info(path, mode));
+    EXPECT_EQ(lines[3], info(kFolder, "40755"));
+  };
+  root.make_directory(kFolder + "/directory");
+  root.write_plist(kFolder + "/target", sample());
+  root.make_link("target", kFolder + "/link");
+  unopened("open(" + kFile + ") failed: No such file or directory", kFile, "");
+  unopened(kFolder + "/directory type is 16384, not 32768", kFolder + "/directory", "40755");
+  unopened("open(" + kFolder + "/link) failed: Too many levels of symbolic links", kFolder + "/link", "100644");
+
+  const std::size_t open_before = descriptors_open();
+  for (const std::string content : {"", "bplist00", "<?xml version=\"1.0\"?>"}) {
+    root.write_file(kFile, content);
+    EXPECT_FALSE(load_dict(kFile.c_str()));
+    root.expect_log({"_load_dict: Could not create dictionary from stream"});
+  }
+  std::filesystem::resize_file(root.path(kFile), 0x7ffff001);
+  EXPECT_FALSE(load_mutable_dict(kFile.c_str()));
+  root.expect_log({"_load_dict: too big for our purposes"});
+  EXPECT_EQ(descriptors_open(), open_before);
+}
+
+TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
+  root.write_file(kFolder + "/target", "content");
+  root.make_link("target", kFolder + "/link");
+  const std::string link = kFolder + "/link";
+  EXPECT_EQ(store_dict(link.c_str(), sample()), -1);
+  EXPECT_EQ(root.read_file(kFolder + "/target"), "content");
+  root.expect_log({"_safe_open: open(" + link + ") failed: Too many levels of symbolic links",
+                   "store_dict: Could not create " + link + ": Too many levels of symbolic links", info(link, "100644"),
+                   info(kFolder, "40755")});
+
+  // What cannot be encoded is found out before the file is touched.
+  root.write_file(kFile, "content");
+  EXPECT_EQ(store_dict(kFile.c_str(), PropertyValue()), -1);
+  root.expect_log({"store_dict: Could not serialize dictionary to stream"});
+  EXPECT_EQ(root.read_file(kFile), "content");
+
+  std::signal(SIGXFSZ, SIG_IGN);
+  const rlimit limit{65536, RLIM_INFINITY};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &limit), 0);
+  for (const auto store : {store_dict, store_dict_durably}) {
+    EXPECT_EQ(store(kFile.c_str(), text(std::string(100'000, 'x'))), -1);
+    root.expect_log(
+        {"store_dict: Could not write to " + kFile + ": Success", info(kFile, "100644"), info(kFolder, "40755")});
+  }
+  EXPECT_EQ(root.read_file(kFile).size(), 65536u);
+}
+
+}  // namespace
+}  // namespace quorvel::test

@@ -1,0 +1,337 @@
+// The IPC service against real clients: well-behaved, odd and hostile.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <malloc.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <chrono>
+#include <csignal>
+#include <ctime>
+#include <string>
+#include <thread>
+#include <utility>
+#include <vector>
+
+#include "platform/host/socket_peer.h"
+#include "platform/ipc.h"
+#include "support/descriptors.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+using namespace std::chrono_literals;
+using platform::IpcError;
+using platform::IpcReply;
+using wire::FrameKind;
+
+constexpr const char* kSocket = "com.example.service.sock";
+constexpr std::size_t kLargeSize = 8u << 20;
+
+std::atomic<int> calls_of_silent = 0;
+std::atomic<int> callers_of_meet = 0;
+
+void echo(void*, const PropertyValue& argument, IpcReply reply) noexcept {
+  reply.send(argument, nullptr);
+  reply.send(argument, nullptr);  // one too many, which nobody may notice
+}
+void fail(void*, const PropertyValue&, IpcReply reply) noexcept {
+  const IpcError error = {-7, "it failed"};
+  reply.send(nullptr, &error);
+}
+void silent(void*, const PropertyValue&, IpcReply) noexcept { ++calls_of_silent; }
+void large(void* text, const PropertyValue&, IpcReply reply) noexcept {
+  reply.send(*static_cast<const PropertyValue*>(text), nullptr);
+}
+// Answers only while another call of it runs.
+void meet(void*, const PropertyValue&, IpcReply reply) noexcept {
+  ++callers_of_meet;
+  if (eventually([] { return callers_of_meet >= 2; }, 5s)) reply.send(nullptr, nullptr);
+}
+
+constexpr platform::IpcOperation kOperations[] = {
+    {"echo", echo}, {"fail", fail}, {"silent", silent}, {"large", large}, {"meet", meet}};
+constexpr platform::IpcInterface kInterface = {"Example", kOperations};
+
+class IpcService : public testing::Test {
+ protected:
+  IpcService() {
+    root.make_directory("/run/quorvel");
+    start();
+  }
+  ~IpcService() override { stop(); }
+
+  void start() {
+    listener = platform::create_listener("com.example.service");
+    platform::set_delegate(
+        listener, {&large_text, [](void* object, platform::IpcListener*, platform::IpcConnection* connection) noexcept {
+                     platform::set_exported_interface(connection, &kInterface);
+                     platform::set_exported_object(connection, object);
+                     platform::resume(connection);
+                     return true;
+                   }});
+    ASSERT_EQ(platform::resume(listener), 0);
+  }
+  void stop() {
+    if (listener != nullptr) platform::release_listener(std::exchange(listener, nullptr));
+  }
+
+  static SocketPeer client() { return SocketPeer::connected_to(kSocket); }
+  static std::string call(std::string_view operation, std::uint64_t serial, const PropertyValue& argument = nullptr,
+                          std::uint8_t flags = 0) {
+    return frame_bytes(FrameKind::call, serial, operation, argument, flags);
+  }
+  static void expect_served(SocketPeer& peer, std::chrono::milliseconds patience = kPatience) {
+    static std::uint64_t serial = 1000;
+    ASSERT_TRUE(peer.send(call("echo", ++serial, text("hello"))));
+    const auto reply = peer.receive(patience);
+    ASSERT_TRUE(reply);
+    EXPECT_EQ(reply->kind, FrameKind::reply);
+    EXPECT_EQ(reply->serial, serial);
+    EXPECT_EQ(reply->value, text("hello"));
+  }
+
+  ScratchRoot root;
+  PropertyValue large_text = text(std::string(kLargeSize, 'L'));
+  platform::IpcListener* listener = nullptr;
+};
+
+TEST_F(IpcService, AnswersEveryCallAndKeepsTheConnection) {
+  EXPECT_EQ(root.mode_of(std::string("/run/quorvel/") + kSocket), 0666u);
+  SocketPeer peer = client();
+  std::string garbled = call("echo", 4, text("argument"));
+  garbled.back() = '\x7f';
+  const struct {
+    std::string bytes;
+    FrameKind kind;
+    PropertyValue value;
+  } cases[] = {
+      {call("echo", 1), FrameKind::reply, nullptr},
+      {call("fail", 2), FrameKind::failure, dictionary({{"Code", -7}, {"Description", "it failed"}})},
+      {call("nothing", 3), FrameKind::failure,
+       dictionary({{"Code", 1}, {"Description", "there is no operation of this name"}})},
+      {garbled, FrameKind::failure,
+       dictionary({{"Code", 2}, {"Description", "the argument is not a binary property list"}})},
+      {call("", 5), FrameKind::failure,
+       dictionary({{"Code", 1}, {"Description", "there is no operation of this name"}})},
+      {call("echo", 6, nullptr, wire::kFlagNoReply) + call("silent", 7) + call("echo", 7), FrameKind::reply, nullptr},
+  };
+  std::uint64_t serial = 0;
+  for (const auto& c : cases) {
+    ++serial;
+    ASSERT_TRUE(peer.send(c.bytes));
+    const auto reply = peer.receive();
+    ASSERT_TRUE(reply) << serial;
+    EXPECT_EQ(reply->kind, c.kind) << serial;
+    EXPECT_EQ(reply->serial, serial == 6 ? 7 : serial);
+    EXPECT_EQ(reply->value, c.value) << serial;
+  }
+  EXPECT_EQ(calls_of_silent, 1);
+  for (const char byte : call("echo", 8)) ASSERT_TRUE(peer.send({&byte, 1}));
+  EXPECT_EQ(peer.receive()->serial, 8u);
+  // A frame larger than what is read at once.
+  const PropertyValue argument = text(std::string(60'000, 'x'));
+  ASSERT_TRUE(peer.send(call("echo", 9, argument)));
+  EXPECT_EQ(peer.receive()->value, argument);
+}
+
+TEST_F(IpcService, AnswersManyCallsSentAtOnceInTheirOrder) {
+  SocketPeer peer = client();
+  constexpr std::uint64_t count = 20'000;
+  std::thread sender([&] {
+    std::string bytes;
+    for (std::uint64_t serial = 1; serial <= count; ++serial) bytes += call("echo", serial, text("pipelined"));
+    EXPECT_TRUE(peer.send(bytes));
+    peer.end_sending();
+  });
+  std::uint64_t serial = 0;
+  while (const auto reply = peer.receive()) ASSERT_EQ(reply->serial, ++serial);
+  EXPECT_EQ(serial, count);
+  sender.join();
+}
+
+TEST_F(IpcService, ARefusedFrameClosesItsConnectionAndNoOther) {
+  SocketPeer neighbour = client();
+  expect_served(neighbour);
+  const auto with = [](std::size_t offset, std::string_view bytes) {
+    return call("echo", 1, text("x")).replace(offset, bytes.size(), bytes);
+  };
+  const std::string cases[] = {
+      with(0, "\xff\xff\xff\xff"),               // a body of 4 GiB
+      with(0, std::string_view("\0\1\0\1", 4)),  // one byte more than a call may have
+      with(0, std::string_view("\0\0\0\0", 4)),  // a body shorter than its name
+      with(4, std::string_view("\0", 1)),        // no kind
+      with(4, "\x09"),                           // an unknown kind
+      with(4, "\x02"),                           // a reply
+      with(5, "\x02"),                           // an unknown flag
+      with(6, "\xff\xff"),                       // a name longer than any
+      with(16, "\n"),                            // a name that is not printable
+      "GET / HTTP/1.1\r\n\r\n",
+  };
+  for (const std::string& bytes : cases) {
+    SocketPeer peer = client();
+    EXPECT_TRUE(peer.send(bytes));
+    EXPECT_TRUE(peer.is_closed()) << bytes;
+  }
+  expect_served(neighbour);
+}
+
+TEST_F(IpcService, ServesAClientThatEndedItsSending) {
+  SocketPeer peer = client();
+  ASSERT_TRUE(peer.send(call("large", 1) + call("large", 2)));
+  peer.end_sending();
+  EXPECT_EQ(peer.receive()->value, large_text);
+  EXPECT_EQ(peer.receive()->serial, 2u);
+  EXPECT_TRUE(peer.is_closed());
+  SocketPeer half = client();
+  ASSERT_TRUE(half.send(call("echo", 1).substr(0, 10)));
+  half.end_sending();
+  EXPECT_TRUE(half.is_closed());
+}
+
+TEST_F(IpcService, RunsCallsOfTwoClientsAtOnce) {
+  SocketPeer first = client();
+  SocketPeer second = client();
+  ASSERT_TRUE(first.send(call("meet", 1)));
+  ASSERT_TRUE(second.send(call("meet", 2)));
+  EXPECT_TRUE(first.receive());
+  EXPECT_TRUE(second.receive());
+}
+
+TEST_F(IpcService, ClientsThatNeverReadShareOneReplyAndDelayNobody) {
+  SocketPeer good = client();
+  expect_served(good);
+  constexpr std::size_t count = 40;
+  const std::size_t before = ::mallinfo2().hblkhd;
+  {
+    std::vector<SocketPeer> peers;
+    for (std::size_t i = 0; i < count; ++i) {
+      peers.push_back(client());
+      ASSERT_TRUE(peers.back().send(call("large", i)));
+    }
+    for (auto& peer : peers) {
+      char head[16];
+      while (::recv(peer.descriptor(), head, sizeof head, MSG_PEEK) <= 0) std::this_thread::sleep_for(1ms);
+    }
+    expect_served(good);
+    EXPECT_LT(::mallinfo2().hblkhd - before, 6 * kLargeSize);
+    // Each still gets the reply to its own call.
+    for (const std::size_t i : {std::size_t{0}, count - 1}) {
+      const auto reply = peers[i].receive();
+      ASSERT_TRUE(reply);
+      EXPECT_EQ(reply->serial, i);
+      EXPECT_EQ(reply->value, large_text);
+    }
+  }
+  EXPECT_TRUE(eventually([&] { return ::mallinfo2().hblkhd <= before; })) << ::mallinfo2().hblkhd - before;
+  expect_served(good);
+}
+
+TEST_F(IpcService, KeepsNoDescriptorThatAMessageCarries) {
+  int ends[2];
+  ASSERT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+  Descriptor reading(ends[0]);
+  Descriptor writing(ends[1]);
+  SocketPeer peer = client();
+  std::string bytes = call("echo", 1);
+  iovec part = {bytes.data(), bytes.size()};
+  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
+  msghdr message = {};
+  message.msg_iov = &part;
+  message.msg_iovlen = 1;
+  message.msg_control = control;
+  message.msg_controllen = sizeof control;
+  cmsghdr* attached = CMSG_FIRSTHDR(&message);
+  attached->cmsg_level = SOL_SOCKET;
+  attached->cmsg_type = SCM_RIGHTS;
+  attached->cmsg_len = CMSG_LEN(sizeof(int));
+  *reinterpret_cast<int*>(CMSG_DATA(attached)) = writing.get();
+  ASSERT_EQ(::sendmsg(peer.descriptor(), &message, 0), static_cast<ssize_t>(bytes.size()));
+  EXPECT_TRUE(peer.receive());
+  writing = Descriptor();
+  char byte;
+  EXPECT_EQ(::read(reading.get(), &byte, 1), 0) << "somebody still holds the other end";
+}
+
+TEST_F(IpcService, AHalfSentCallHasItsTimeAndAnIdleClientStays) {
+  SocketPeer idle = client();
+  expect_served(idle);
+  SocketPeer trickling = client();
+  ASSERT_TRUE(trickling.send(call("echo", 1).substr(0, 5)));
+  EXPECT_FALSE(trickling.is_closed(6s));
+  ASSERT_TRUE(trickling.send(call("echo", 1).substr(5, 5)));
+  EXPECT_TRUE(trickling.is_closed(8s)) << "each byte bought more time";
+  expect_served(idle);
+}
+
+TEST_F(IpcService, ItsEndClosesEveryConnectionAndDescriptor) {
+  stop();
+  const std::size_t open_before = descriptors_open();
+  start();
+  std::vector<SocketPeer> peers;
+  for (int i = 0; i < 20; ++i) {
+    peers.push_back(client());
+    ASSERT_TRUE(peers.back().send(i % 2 == 0 ? call("large", 1) : call("echo", 1).substr(0, 7)));
+  }
+  stop();
+  for (auto& peer : peers) {
+    while (peer.receive()) continue;
+  }
+  peers.clear();
+  EXPECT_EQ(descriptors_open(), open_before);
+  EXPECT_FALSE(root.exists(std::string("/run/quorvel/") + kSocket));
+}
+
+// A crowd in a process of its own, which connects and stays silent.
+class Crowd {
+ public:
+  explicit Crowd(int size) : pid_(::fork()) {
+    if (pid_ != 0) return;
+    rlimit limit;
+    ::getrlimit(RLIMIT_NOFILE, &limit);
+    limit.rlim_cur = limit.rlim_max;
+    ::setrlimit(RLIMIT_NOFILE, &limit);
+    for (int i = 0; i < size; ++i) {
+      SocketPeer peer = SocketPeer::connected_to(kSocket);
+      static_cast<void>(::dup(peer.descriptor()));
+    }
+    ::pause();
+  }
+  ~Crowd() {
+    ::kill(pid_, SIGKILL);
+    ::waitpid(pid_, nullptr, 0);
+  }
+
+ private:
+  pid_t pid_;
+};
+
+std::chrono::nanoseconds processor_time() {
+  timespec used;
+  ::clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &used);
+  return std::chrono::seconds(used.tv_sec) + std::chrono::nanoseconds(used.tv_nsec);
+}
+
+TEST_F(IpcService, OutOfDescriptorsItRestsAndAnIdleCrowdLocksNobodyOut) {
+  rlimit limit;
+  ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &limit), 0);
+  limit.rlim_cur = 64;
+  ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &limit), 0);
+  const std::size_t open_before = descriptors_open();
+  const Crowd crowd(60);
+  ASSERT_TRUE(eventually([&] { return descriptors_open() >= open_before + 24; }));
+  const auto used_before = processor_time();
+  std::this_thread::sleep_for(500ms);
+  EXPECT_LT(processor_time() - used_before, 50ms) << "it spins";
+  EXPECT_LE(descriptors_open(), 64u - 8u) << "no reserve is left";
+  SocketPeer good = client();
+  expect_served(good);
+}
+
+}  // namespace
+}  // namespace quorvel::test

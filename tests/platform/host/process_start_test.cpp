@@ -1,0 +1,104 @@
+// What must hold before the daemon logs its first line, and what keeps it from starting.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstdlib>
+#include <string>
+
+#include "platform/host/local_socket.h"
+#include "platform/host/socket_peer.h"
+#include "platform/process.h"
+#include "support/scratch_root.h"
+
+namespace quorvel::test {
+namespace {
+
+using testing::ExitedWithCode;
+
+constexpr const char* kService = "com.example.service";
+constexpr const char* kSocket = "com.example.service.sock";
+
+// Starts a process of its own, which ends with what `start_process` returned.
+#define EXPECT_START(status, line) \
+  EXPECT_EXIT(std::exit(platform::start_process(kService)), ExitedWithCode(status), line)
+
+TEST(ProcessStart, RefusesARootThatIsNoDirectory) {
+  ScratchRoot root;
+  root.write_file("/file", "");
+  for (const std::string& value :
+       {std::string(), std::string("relative"), root.path("/file").string(), root.path("/missing").string()}) {
+    ::setenv("QUORVEL_ROOT", value.c_str(), 1);
+    EXPECT_START(78, "^quorveld: QUORVEL_ROOT must be the absolute path of a directory: [^\n]*\n$") << value;
+  }
+}
+
+TEST(ProcessStart, SettlesWhatTheDaemonRestsOn) {
+  ScratchRoot root;
+  root.remove("/run");
+  const auto settled = [&] {
+    ::close(STDIN_FILENO);
+    if (platform::start_process(kService) != 0) return 1;
+    struct stat input;
+    if (::fstat(STDIN_FILENO, &input) != 0 || !S_ISCHR(input.st_mode)) return 2;
+    if (root.mode_of("/run/quorvel") != 0755 || root.mode_of("/run/quorvel/notifications.sock") != 0666) return 3;
+    if (::raise(SIGPIPE) != 0 || ::raise(SIGXFSZ) != 0 || ::raise(SIGTERM) != 0) return 4;
+    return 0;
+  };
+  EXPECT_EXIT(std::exit(settled()), ExitedWithCode(0), "^$");
+  EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
+}
+
+TEST(ProcessStart, RefusesASecondInstance) {
+  ScratchRoot root;
+  root.make_directory("/run/quorvel");
+  {
+    const Descriptor lock(::open(root.path("/run/quorvel/quorveld.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_EQ(::flock(lock.get(), LOCK_EX), 0);
+    EXPECT_START(69, "^quorveld: another quorveld is running [^\n]*\n$");
+  }
+  {
+    const Descriptor live = listen_on(kSocket);
+    EXPECT_START(69, "^quorveld: another process serves com.example.service.sock\n$");
+    EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
+  }
+  EXPECT_START(0, "^$") << "the socket is stale now";
+}
+
+TEST(ProcessStart, RefusesALockFileThatIsNone) {
+  ScratchRoot root;
+  root.make_fifo("/run/quorvel/quorveld.lock");
+  EXPECT_START(71, "^quorveld: cannot open the lock file [^\n]*\n$");
+  root.remove("/run/quorvel/quorveld.lock");
+  root.make_link("/decoy", "/run/quorvel/quorveld.lock");
+  EXPECT_START(71, "^quorveld: cannot open the lock file [^\n]*\n$");
+  EXPECT_FALSE(root.exists("/decoy"));
+}
+
+TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
+  using platform::host::ListeningSocket;
+  ScratchRoot root(std::string(150, 'l'));
+  root.write_file("/run/quorvel/a.sock", "kept");
+  EXPECT_FALSE(ListeningSocket::open("a.sock"));
+  EXPECT_EQ(errno, EEXIST);
+  EXPECT_EQ(root.read_file("/run/quorvel/a.sock"), "kept");
+  root.remove("/run/quorvel/a.sock");
+  static_cast<void>(listen_on("a.sock"));
+  {
+    const ListeningSocket socket = ListeningSocket::open("a.sock");
+    EXPECT_TRUE(socket);
+    EXPECT_EQ(root.mode_of("/run/quorvel/a.sock"), 0666u);
+    EXPECT_FALSE(ListeningSocket::open("a.sock"));
+    EXPECT_EQ(errno, EADDRINUSE);
+  }
+  EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));
+  EXPECT_FALSE(ListeningSocket::open(std::string(100, 'n')));
+  EXPECT_EQ(errno, ENAMETOOLONG);
+}
+
+}  // namespace
+}  // namespace quorvel::test

@@ -1,0 +1,182 @@
+// quorvelctl as a person and a script use it: what it prints where, and how it ends.
+#include <gtest/gtest.h>
+
+#include <thread>
+
+#include "support/program.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+class Quorvelctl : public testing::Test {
+ protected:
+  Quorvelctl() { root.ignore_log(); }
+
+  struct Expected {
+    std::vector<std::string> words;
+    int status;
+    std::string out;
+  };
+
+  // Every call must end so, print exactly that, and tell a person something on standard error when it did not work.
+  static void expect_calls(const std::vector<Expected>& calls) {
+    for (const Expected& call : calls) {
+      const Outcome outcome = run_to_end(control_program(), call.words);
+      const std::string words = testing::PrintToString(call.words) + "\n" + outcome.err;
+      EXPECT_EQ(outcome.status, call.status) << words;
+      EXPECT_EQ(outcome.out, call.out) << words;
+      EXPECT_TRUE(call.status == 0 || outcome.err.starts_with("quorvelctl: ")) << words;
+    }
+  }
+
+  ScratchRoot root;
+};
+
+TEST_F(Quorvelctl, EndsAsPromisedWithoutAnybodyToTalkTo) {
+  expect_calls({
+      {{}, 2, ""},
+      {{"frobnicate"}, 2, ""},
+      {{"ark"}, 2, ""},
+      {{"ark", "get"}, 2, ""},
+      {{"ark", "get", "Key", "surplus"}, 2, ""},
+      {{"--root", root.path("/nowhere"), "ark", "list"}, 2, ""},
+      {{"sim", "set", "iccid", "text"}, 2, ""},
+      {{"sim", "set", "colour", "1"}, 2, ""},
+      {{"sim", "fail", "imsi", "1", "4294967296"}, 2, ""},
+      {{"sim", "notify", "sim-lost"}, 2, ""},
+      {{"sim", "insert", "--iccid", "1"}, 2, ""},
+      {{"preferences", "set", "../../escape", "Key", "1"}, 2, ""},
+      {{"preferences", "set", "com.example", "Key", "null"}, 2, ""},
+      {{"preferences", "list", "com.example", "--json"}, 1, "null\n"},
+      {{"preferences", "delete", "com.example", "Key"}, 1, ""},
+      {{"regulatory-images"}, 3, ""},
+      {{"monitor"}, 3, ""},
+      {{"sim", "show"}, 3, ""},
+      {{"log"}, 3, ""},
+      {{"ark", "list"}, 3, ""},
+      {{"plist", "show", root.path("/nothing.plist")}, 3, ""},
+  });
+  EXPECT_EQ(run_to_end(control_program(), {"--help"}).status, 0);
+  EXPECT_EQ(run_to_end(control_program(), {"sim", "insert", "--help"}).status, 0);
+}
+
+TEST_F(Quorvelctl, ReadsTheSavedArkAsTheDaemonWould) {
+  root.make_directory(kStateDirectory, 0700);
+  expect_calls({{{"ark", "list", "--json"}, 0, "{}\n"}, {{"ark", "get", "Key", "--json"}, 1, "null\n"}});
+  root.write_plist(kDataFile, dictionary({{"-Key", 5}, {"a-b-c", "x"}, {"a-", true}, {"-ProductVersion", "stored"}}));
+  root.write_plist("/etc/quorvel/device_information.plist", dictionary({{"ProductVersion", "2.5"}}));
+  expect_calls({
+      {{"ark", "list", "--json"}, 0, "{\n  \"Key\": 5,\n  \"ProductVersion\": \"stored\"\n}\n"},
+      {{"ark", "list", "--domain", "a", "--json"}, 0, "{\n  \"\": true,\n  \"b-c\": \"x\"\n}\n"},
+      {{"ark", "list", "--domain", "none", "--json"}, 0, "{}\n"},
+      {{"ark", "get", "Key"}, 0, "5\n"},
+      {{"ark", "get", "--domain", "a-b", "c", "--json"}, 0, "\"x\"\n"},
+      {{"ark", "get", "ProductVersion", "--json"}, 0, "\"2.5\"\n"},
+      {{"ark", "get", "--domain", "com.Orvane.mobile.internal", "DiagData"}, 1, ""},
+  });
+  root.write_file(kDataFile, "bplist00");
+  expect_calls({{{"ark", "list"}, 3, ""}});
+}
+
+TEST_F(Quorvelctl, ChangesPreferencesWholeAndKeepsTheRest) {
+  const std::string path = "/private/var/mobile/Library/Preferences/com.example.plist";
+  root.remove("/private/var/mobile/Library");
+  expect_calls({
+      {{"preferences", "set", "com.example", "Number", "-5"}, 0, ""},
+      {{"preferences", "set", "com.example", "List", "[1,{}]"}, 0, ""},
+      {{"preferences", "get", "com.example", "Number"}, 0, "-5\n"},
+      {{"preferences", "get", "com.example", "Absent", "--json"}, 1, "null\n"},
+  });
+  root.set_mode(path, 0640);
+  std::vector<std::thread> writers;
+  for (int i = 0; i < 8; ++i) {
+    writers.emplace_back([i] {
+      EXPECT_EQ(run_to_end(control_program(), {"preferences", "set", "com.example", std::to_string(i), "true"}).status,
+                0);
+    });
+  }
+  for (std::thread& writer : writers) writer.join();
+  EXPECT_EQ(root.read_plist(path).size(), 10u);
+  EXPECT_EQ(root.mode_of(path), 0640u);
+  expect_calls({{{"preferences", "delete", "com.example", "List"}, 0, ""}});
+  EXPECT_EQ(root.read_plist(path).size(), 9u);
+  root.write_file(path, "garbage");
+  expect_calls({{{"preferences", "set", "com.example", "Number", "1"}, 3, ""}});
+  EXPECT_EQ(root.read_file(path), "garbage");
+}
+
+TEST_F(Quorvelctl, WritesPropertyListsThatItShows) {
+  const std::string path = root.path("/etc/file.plist");
+  root.write_file("/etc/file.plist", "old");
+  root.set_mode("/etc/file.plist", 0600);
+  const std::string json = "{\n  \"A\": {\n    \"$data\": \"AAEC\"\n  },\n  \"B\": 2.0\n}\n";
+  EXPECT_EQ(run_to_end(control_program(), {"plist", "write", path}, json).status, 0);
+  EXPECT_EQ(root.mode_of("/etc/file.plist"), 0600u);
+  expect_calls({{{"plist", "show", path, "--json"}, 0, json}});
+  const Outcome written = run_to_end(control_program(), {"plist", "write", "-"}, json);
+  EXPECT_EQ(written.out, root.read_file("/etc/file.plist"));
+  for (const char* wrong : {"", "null", "{", "{\"$data\": 1}"}) {
+    EXPECT_EQ(run_to_end(control_program(), {"plist", "write", path}, wrong).status, 2) << wrong;
+  }
+  EXPECT_EQ(written.out, root.read_file("/etc/file.plist"));
+}
+
+TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
+  const std::string made = root.outside() / "made" / "device";
+  for (int i = 0; i < 2; ++i) EXPECT_EQ(run_to_end(control_program(), {"root", "create", made}).status, 0);
+  EXPECT_EQ(std::filesystem::read_symlink(made + "/var"), "private/var");
+  Program simulator(simulator_program(), {.input = {}, .environment = {{"QUORVEL_ROOT", made}}});
+  ASSERT_TRUE(simulator.wait_for_output("ready"));
+  Program daemon(daemon_program(), {.input = {}, .environment = {{"QUORVEL_ROOT", made}}});
+  ASSERT_TRUE(daemon.wait_until_ready());
+  Program monitor(control_program(), {.arguments = {"--root", made, "monitor", "--json"}, .input = {}});
+  ASSERT_TRUE(eventually([&] { return monitor.err().find("listening") != std::string::npos; }));
+  const auto call = [&](std::vector<std::string> words) {
+    words.insert(words.begin(), {"--root", made});
+    return run_to_end(control_program(), words);
+  };
+  EXPECT_NE(call({"regulatory-images", "--json"}).out.find("\"Mark\": \"CE\""), std::string::npos);
+  EXPECT_EQ(call({"sim", "insert", "--iccid", "89", "--imsi", "23"}).status, 0);
+  EXPECT_TRUE(monitor.wait_for_output("\"sequence\":3"));
+  EXPECT_EQ(call({"sim", "eject"}).status, 0);
+  EXPECT_TRUE(monitor.wait_for_output("\"sequence\":4"));
+  EXPECT_EQ(call({"sim", "show", "--json"}).out,
+            "{\n  \"iccid\": {\n    \"Value\": \"\"\n  },\n  \"imsi\": {\n    \"Value\": \"\"\n  },\n"
+            "  \"sim-status\": {\n    \"Value\": \"NotInserted\"\n  }\n}\n");
+  EXPECT_EQ(call({"sim", "set", "connection", "1"}).status, 2);
+  EXPECT_TRUE(eventually([&] { return call({"log"}).out.find("The IMSI has been removed") != std::string::npos; }));
+  EXPECT_EQ(monitor.stop().status, 0);
+  EXPECT_EQ(simulator.stop().status, 0);
+  std::filesystem::remove(made + "/private/var/mobile/Library/qvd/regulatory_images/regulatory_images.plist");
+  const Outcome none = call({"regulatory-images", "--json"});
+  EXPECT_EQ(none.status, 1);
+  EXPECT_EQ(none.out, "null\n");
+}
+
+TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
+  const std::string previous = std::string(kLogFile) + ".1";
+  root.write_file(previous, "one\n");
+  root.write_file(kLogFile, "two\n");
+  expect_calls({{{"log"}, 0, "one\ntwo\n"}, {{"log", "--json"}, 0, "[\n  \"one\",\n  \"two\"\n]\n"}});
+  Program follower(control_program(), {.arguments = {"log", "--follow"}, .input = {}});
+  ASSERT_TRUE(follower.wait_for_output("two\n"));
+  std::filesystem::rename(root.path(kLogFile), root.path(previous));
+  root.write_file(kLogFile, "three\n");
+  EXPECT_TRUE(follower.wait_for_output("three\n"));
+  // Two rotations that the follower meets as one.
+  follower.send_signal(SIGSTOP);
+  for (const char* line : {"four\n", "five\n"}) {
+    std::filesystem::rename(root.path(kLogFile), root.path(previous));
+    root.write_file(kLogFile, line);
+  }
+  follower.send_signal(SIGCONT);
+  EXPECT_TRUE(follower.wait_for_output("five\n"));
+  const Outcome outcome = follower.stop();
+  EXPECT_EQ(outcome.out, "one\ntwo\nthree\nfour\nfive\n");
+  EXPECT_EQ(outcome.status, 0);
+}
+
+}  // namespace
+}  // namespace quorvel::test

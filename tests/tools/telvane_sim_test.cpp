@@ -1,0 +1,162 @@
+// The simulator's socket: what observers are pushed, what commands are answered, and who is cut off.
+#include <gtest/gtest.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+
+#include <csignal>
+#include <thread>
+
+#include "platform/property/binary.h"
+#include "platform/telephony.h"
+#include "platform/wire/frame.h"
+#include "platform/wire/telephony_state.h"
+#include "quorvel/client.h"
+#include "support/program.h"
+#include "support/scratch_root.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+const std::string kSocket = "/run/quorvel/telvane.sock";
+
+// A connection as the daemon makes one.
+class Observer {
+ public:
+  explicit Observer(const ScratchRoot& root) : socket_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    root.path(kSocket).string().copy(address.sun_path, sizeof address.sun_path - 1);
+    if (::connect(socket_.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+      throw std::runtime_error("cannot connect");
+    }
+  }
+
+  // The next frame's kind, name and value as one text; empty at the end of the connection.
+  std::string next() {
+    wire::Frame frame;
+    while (wire::parse_frame(received_.bytes().subspan(taken_), wire::kMaximumStateBody, frame) !=
+           wire::FrameResult::complete) {
+      received_.consume(taken_);
+      taken_ = 0;
+      char bytes[65536];
+      pollfd wait{socket_.get(), POLLIN, 0};
+      if (::poll(&wait, 1, static_cast<int>(kPatience.count())) != 1) return "nothing came";
+      const ssize_t count = ::recv(socket_.get(), bytes, sizeof bytes, 0);
+      if (count <= 0) return "";
+      if (!received_.append(bytes, static_cast<std::size_t>(count))) return "no memory";
+    }
+    taken_ += wire::kFrameHeadSize + frame.head.body_length;
+    const std::string kind = frame.head.kind == wire::FrameKind::state ? "state" : "event ";
+    return kind + std::string(frame.name) + " " + described(read_binary(frame.payload, Mutability::immutable));
+  }
+
+  void send(std::string_view bytes) const { ::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL); }
+
+ private:
+  Descriptor socket_;
+  ByteBuffer received_;
+  std::size_t taken_ = 0;
+};
+
+class TelvaneSim : public testing::Test {
+ protected:
+  TelvaneSim() : simulator_(std::in_place, simulator_program()) {
+    root.ignore_log();
+    if (!simulator_->wait_for_output("ready")) throw std::runtime_error("the simulator does not start");
+  }
+
+  client::Reply call(std::string_view command, const PropertyValue& argument) {
+    client::Options options;
+    options.service = "telvane";
+    options.timeout = std::chrono::minutes(1);
+    return client::Client(options).call(command, argument);
+  }
+
+  ScratchRoot root;
+  std::optional<Program> simulator_;
+};
+
+TEST_F(TelvaneSim, PushesItsStateAndTakesCommands) {
+  Observer observer(root);
+  EXPECT_EQ(observer.next(), "state {}");
+  EXPECT_FALSE(call("set", dictionary({{"Field", "gid1"}, {"Value", array({1, "x"})}})).error);
+  EXPECT_FALSE(call("fail", dictionary({{"Field", "gid1"}, {"Domain", 1}, {"Code", -5}})).error);
+  EXPECT_FALSE(call("notify", dictionary({{"Name", "phone-number-changed"}, {"Count", 2}})).error);
+  const std::string state = R"({"gid1": {"Code": -5, "Domain": 1, "Value": [1, "x"]}})";
+  EXPECT_EQ(observer.next(), "event phone-number-changed " + state);
+  EXPECT_EQ(observer.next(), "event phone-number-changed " + state);
+  EXPECT_EQ(described(call("show", {}).value), state);
+  EXPECT_FALSE(call("succeed", dictionary({{"Field", "gid1"}})).error);
+  EXPECT_FALSE(call("set", dictionary({{"Field", "gid1"}})).error);
+  EXPECT_EQ(described(call("show", {}).value), "{}");
+
+  const std::pair<const char*, PropertyValue> refused[] = {
+      {"dance", {}},
+      {"set", {}},
+      {"set", dictionary({{"Field", "colour"}, {"Value", 1}})},
+      {"set", dictionary({{"Field", "connection"}, {"Value", 1}})},
+      {"fail", dictionary({{"Field", "sim-status"}, {"Domain", 1}, {"Code", 1}})},
+      {"fail", dictionary({{"Field", "imsi"}, {"Domain", 1}, {"Code", std::int64_t{1} << 31}})},
+      {"notify", dictionary({{"Name", "sim-lost"}})},
+      {"notify", dictionary({{"Name", "phone-number-changed"}, {"Count", -1}})},
+  };
+  for (const auto& [command, argument] : refused) {
+    const client::Reply reply = call(command, argument);
+    EXPECT_TRUE(reply.error && reply.error->code == client::ErrorCode::service_failure) << command;
+  }
+  Observer newcomer(root);
+  EXPECT_EQ(newcomer.next(), "state {}");
+  for (const char* garbage : {"garbage that is no frame", "\0\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1"}) {
+    Observer hostile(root);
+    hostile.send(std::string_view(garbage, 16));
+    EXPECT_EQ(hostile.next(), "state {}");
+    EXPECT_EQ(hostile.next(), "");
+  }
+}
+
+TEST_F(TelvaneSim, DeliversABurstInOrderAndCutsOffWhoDoesNotRead) {
+  constexpr int kRounds = 50;
+  constexpr int kBurst = 2000;
+  ASSERT_FALSE(call("set", dictionary({{"Field", "gid2"}, {"Value", std::string(2000, 'x')}})).error);
+  Observer observer(root);
+  Observer asleep(root);
+  std::thread commander([&] {
+    for (int i = 0; i < kRounds; ++i) {
+      EXPECT_FALSE(call("set", dictionary({{"Field", "gid1"}, {"Value", i}})).error);
+      EXPECT_FALSE(call("notify", dictionary({{"Name", "sim-status-changed"}, {"Count", kBurst}})).error);
+    }
+  });
+  EXPECT_TRUE(observer.next().starts_with("state"));
+  for (int i = 0; i < kRounds * kBurst; ++i) {
+    const std::string event = observer.next();
+    const std::string expected = "\"gid1\": {\"Value\": " + std::to_string(i / kBurst) + "}";
+    ASSERT_TRUE(event.starts_with("event sim-status-changed ")) << event;
+    ASSERT_NE(event.find(expected), std::string::npos) << event.substr(0, 200);
+  }
+  commander.join();
+  EXPECT_TRUE(asleep.next().starts_with("state"));
+  for (std::string rest = "x"; !rest.empty(); rest = asleep.next()) ASSERT_NE(rest, "nothing came");
+}
+
+TEST_F(TelvaneSim, ReplacesADeadOnesSocketAndRespectsALiveOnes) {
+  EXPECT_EQ(run_to_end(simulator_program(), {}).status, 69);
+  simulator_->send_signal(SIGKILL);
+  simulator_->wait();
+  EXPECT_TRUE(root.exists(kSocket));
+  simulator_.emplace(simulator_program());
+  ASSERT_TRUE(simulator_->wait_for_output("ready"));
+  EXPECT_EQ(Observer(root).next(), "state {}");
+  EXPECT_EQ(simulator_->stop().status, 0);
+  EXPECT_FALSE(root.exists(kSocket));
+  root.write_file(kSocket, "a file");
+  EXPECT_EQ(run_to_end(simulator_program(), {}).status, 71);
+  EXPECT_EQ(root.read_file(kSocket), "a file");
+  EXPECT_EQ(run_to_end(simulator_program(), {"--root", root.path("/nowhere")}).status, 78);
+  EXPECT_EQ(run_to_end(simulator_program(), {"surplus"}).status, 64);
+}
+
+}  // namespace
+}  // namespace quorvel::test

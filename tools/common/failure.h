@@ -1,0 +1,22 @@
+// How a command of these tools ends when it cannot do what it was asked.
+#pragma once
+
+#include <string>
+#include <utility>
+
+namespace quorvel::tools {
+
+enum ExitStatus : int {
+  kDone = 0,
+  kNoValue = 1,      // there is no such value
+  kWrongWords = 2,   // the words of the call are off
+  kUnreachable = 3,  // a service or file cannot be reached or read
+};
+
+/// Thrown by a command; main prints the message, which says what to do next, and ends with the status.
+struct Failure {
+  int status;
+  std::string message;
+};
+
+}  // namespace quorvel::tools

@@ -1,0 +1,87 @@
+#include "human_text.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <vector>
+
+#include "platform/property/description.h"
+
+namespace quorvel::tools {
+namespace {
+
+constexpr Palette kPlain{};
+constexpr Palette kColours{"\x1b[36m", "\x1b[2m", "\x1b[1m", "\x1b[0m"};
+
+bool wants_colours() {
+  const char* terminal = std::getenv("TERM");
+  const char* refused = std::getenv("NO_COLOR");
+  return ::isatty(STDOUT_FILENO) == 1 && (refused == nullptr || *refused == '\0') && terminal != nullptr &&
+         std::string_view(terminal) != "dumb";
+}
+
+void append_value(const PropertyValue& value, std::size_t depth, std::string& text);
+
+// What follows a key or dash: a leaf on the same line, a container's elements on lines of their own.
+void append_element(const PropertyValue& value, std::size_t depth, std::string& text) {
+  if (value.is_container() && value.size() > 0) {
+    text += '\n';
+    append_value(value, depth + 1, text);
+  } else {
+    text += ' ' + one_line(value) + '\n';
+  }
+}
+
+void append_dictionary(const PropertyValue& dictionary, std::size_t depth, std::string& text) {
+  std::vector<std::pair<std::string_view, const PropertyValue*>> entries;
+  for (const auto [key, value] : dictionary.entries()) entries.emplace_back(key.text(), &value);
+  std::sort(entries.begin(), entries.end(), [](const auto& a, const auto& b) { return a.first < b.first; });
+  const Palette& colours = palette();
+  for (const auto& [key, value] : entries) {
+    text.append(2 * depth, ' ').append(colours.key).append(one_line(PropertyValue::string(key)));
+    text.append(colours.reset).append(":");
+    append_element(*value, depth, text);
+  }
+}
+
+void append_value(const PropertyValue& value, std::size_t depth, std::string& text) {
+  if (value.is_dictionary()) return append_dictionary(value, depth, text);
+  for (std::size_t i = 0; i < value.size(); ++i) {
+    text.append(2 * depth, ' ').append("-");
+    append_element(value.at(i), depth, text);
+  }
+}
+
+}  // namespace
+
+const Palette& palette() {
+  static const Palette& chosen = wants_colours() ? kColours : kPlain;
+  return chosen;
+}
+
+std::string one_line(const PropertyValue& value) {
+  if (value.is_string() && value.text().empty()) return "\"\"";
+  std::string text(256, '\0');
+  for (;;) {
+    TextSink sink(text);
+    describe(value, sink);
+    if (!sink.full()) {
+      text.resize(static_cast<std::size_t>(sink.position() - text.data()));
+      return text;
+    }
+    text.resize(text.size() * 2);
+  }
+}
+
+std::string human_text(const PropertyValue& value) {
+  std::string text;
+  if (value.is_container() && value.size() > 0) {
+    append_value(value, 0, text);
+  } else {
+    text = one_line(value) + '\n';
+  }
+  return text;
+}
+
+}  // namespace quorvel::tools

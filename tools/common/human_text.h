@@ -1,0 +1,25 @@
+// Values for a reader at a terminal.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "platform/property/value.h"
+
+namespace quorvel::tools {
+
+/// Which texts stand out on a terminal; every one is empty elsewhere.
+struct Palette {
+  std::string_view key, quiet, strong, reset;
+};
+
+/// The palette for standard output.
+[[nodiscard]] const Palette& palette();
+
+/// A value that fits one line, described like in the log.
+[[nodiscard]] std::string one_line(const PropertyValue& value);
+
+/// A value over as many lines as it takes, indented, keys in ascending order, ending with a line end.
+[[nodiscard]] std::string human_text(const PropertyValue& value);
+
+}  // namespace quorvel::tools

@@ -1,0 +1,41 @@
+#include "root_option.h"
+
+#include <fcntl.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <system_error>
+
+#include "failure.h"
+#include "platform/descriptor.h"
+#include "platform/file_system.h"
+
+namespace quorvel::tools {
+namespace {
+
+constexpr int kBadConfiguration = 78;
+
+}  // namespace
+
+void use_device_root(const std::string& directory, int status) {
+  if (!directory.empty()) {
+    std::error_code error;
+    const std::filesystem::path path = std::filesystem::absolute(directory, error);
+    if (error || ::setenv("QUORVEL_ROOT", path.c_str(), 1) != 0) {
+      throw Failure{status, "--root \"" + directory + "\" cannot be used: " + error.message()};
+    }
+  }
+  if (Descriptor(platform::open_file("/", O_PATH | O_DIRECTORY, 0))) return;
+  const std::string reason = std::strerror(errno);
+  if (!directory.empty()) {
+    throw Failure{status, "--root \"" + directory + "\": " + reason +
+                              ". Make a device root with: quorvelctl root create " + directory};
+  }
+  const char* value = std::getenv("QUORVEL_ROOT");
+  throw Failure{kBadConfiguration, std::string("QUORVEL_ROOT is \"") + (value != nullptr ? value : "") +
+                                       "\": " + reason + ". Set it to the absolute path of a directory, or unset it"};
+}
+
+}  // namespace quorvel::tools

@@ -1,0 +1,35 @@
+#include "words.h"
+
+namespace quorvel::tools {
+namespace {
+
+constexpr char kMark = '\x01';
+
+bool needs_mark(const std::string& word) {
+  if (word.empty()) return false;
+  if (word[0] == '-') return word.size() > 1 && word[1] >= '0' && word[1] <= '9';
+  return word[0] == '{' || word[0] == '[' || word[0] == kMark;
+}
+
+}  // namespace
+
+std::vector<std::string> marked_words(int count, char** words) {
+  std::vector<std::string> marked;
+  for (int i = count - 1; i > 0; --i) {
+    std::string word = words[i];
+    if (needs_mark(word)) word.insert(word.begin(), kMark);
+    marked.push_back(std::move(word));
+  }
+  return marked;
+}
+
+CLI::Option* add_word(CLI::App& command, const std::string& name, std::string& word, const std::string& help) {
+  const auto take = [&word](const CLI::results_t& results) {
+    word = results.front();
+    if (word.starts_with(kMark)) word.erase(0, 1);
+    return true;
+  };
+  return command.add_option(name, take, help)->type_name("");
+}
+
+}  // namespace quorvel::tools

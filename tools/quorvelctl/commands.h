@@ -1,0 +1,35 @@
+// The commands of quorvelctl. Each function adds one command to the parser; a command that the words of a call choose
+// leaves what it is to do in `CommandLine::run`.
+#pragma once
+
+#include <CLI/CLI.hpp>
+#include <functional>
+#include <string>
+
+#include "common/failure.h"
+
+namespace quorvel::tools {
+
+struct CommandLine {
+  bool json = false;
+  std::string root;
+  /// False for a command on ordinary paths, for which the device root need not be there.
+  bool uses_root = true;
+  /// Does the work and returns the exit status, or throws Failure.
+  std::function<int()> run;
+};
+
+void add_regulatory_images(CLI::App& app, CommandLine& line);
+void add_ark(CLI::App& app, CommandLine& line);
+void add_monitor(CLI::App& app, CommandLine& line);
+void add_preferences(CLI::App& app, CommandLine& line);
+void add_plist(CLI::App& app, CommandLine& line);
+void add_root(CLI::App& app, CommandLine& line);
+void add_log(CLI::App& app, CommandLine& line);
+void add_sim(CLI::App& app, CommandLine& line);
+
+/// A command with its one-line summary and the examples that its help ends with.
+CLI::App* add_command(CLI::App& parent, const std::string& name, const std::string& summary,
+                      const std::string& examples);
+
+}  // namespace quorvel::tools

@@ -1,0 +1,56 @@
+#include "output.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+
+#include "common/failure.h"
+#include "common/human_text.h"
+#include "common/json.h"
+
+namespace quorvel::tools {
+
+void write_output(std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t written = ::write(STDOUT_FILENO, text.data(), text.size());
+    if (written >= 0) {
+      text.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno != EINTR) {
+      throw Failure{kUnreachable, std::string("cannot write to standard output: ") + std::strerror(errno)};
+    }
+  }
+}
+
+int print_value(const PropertyValue& value, bool json) {
+  write_output(json ? to_json(value, 2) + '\n' : human_text(value));
+  return kDone;
+}
+
+int print_no_value(const std::string& why, bool json) {
+  if (json) write_output("null\n");
+  note(why);
+  return kNoValue;
+}
+
+void note(const std::string& text) {
+  const std::string line = "quorvelctl: " + text + '\n';
+  // A reader who cannot be told is not a reason to fail.
+  [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
+}
+
+PropertyValue value_of_word(const std::string& word, const std::string& what) {
+  ParsedJson parsed = parse_json(word);
+  if (parsed.error) throw Failure{kWrongWords, what + ": " + *parsed.error};
+  return std::move(parsed.value);
+}
+
+void end_when_interrupted() {
+  struct sigaction action {};
+  action.sa_handler = [](int) { ::_exit(kDone); };
+  ::sigaction(SIGINT, &action, nullptr);
+  ::sigaction(SIGTERM, &action, nullptr);
+}
+
+}  // namespace quorvel::tools

@@ -1,0 +1,30 @@
+// What goes to standard output: the value asked for and nothing else. Everything else goes to standard error.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "platform/property/value.h"
+
+namespace quorvel::tools {
+
+/// Writes and flushes; throws Failure when that cannot be done.
+void write_output(std::string_view text);
+
+/// Prints a value for a reader or as JSON. Returns kDone.
+int print_value(const PropertyValue& value, bool json);
+
+/// For a value that is not there: `null` with `json`, and `why` on standard error. Returns kNoValue.
+int print_no_value(const std::string& why, bool json);
+
+/// A line for the reader on standard error.
+void note(const std::string& text);
+
+/// The value that a word of the call stands for as JSON, none for null. Throws Failure with `what` when it is not JSON.
+[[nodiscard]] PropertyValue value_of_word(const std::string& word, const std::string& what);
+
+/// Has SIGINT and SIGTERM end the process with status 0: for commands that run until they are interrupted and write
+/// whole lines.
+void end_when_interrupted();
+
+}  // namespace quorvel::tools

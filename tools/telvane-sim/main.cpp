@@ -1,0 +1,101 @@
+#include <sys/signalfd.h>
+
+#include <CLI/CLI.hpp>
+#include <cerrno>
+#include <csignal>
+#include <cstdio>
+#include <cstring>
+
+#include "common/failure.h"
+#include "common/root_option.h"
+#include "platform/file_system.h"
+#include "platform/process.h"
+#include "platform/wire/service_path.h"
+#include "server.h"
+
+namespace quorvel::tools {
+namespace {
+
+// As sysexits.h has them.
+constexpr int kUsage = 64;
+constexpr int kServiceUnavailable = 69;
+constexpr int kSystemError = 71;
+constexpr int kConfiguration = 78;
+
+constexpr const char* kFooter = R"(
+Serves /run/quorvel/telvane.sock in the device root, in the foreground, until
+SIGTERM or SIGINT. It starts without a SIM and with every query answering nothing.
+
+Examples:
+  telvane-sim --root /tmp/device &
+  quorvelctl --root /tmp/device sim insert --iccid 8944501234567890123 --imsi 234150999999999
+
+Exit status: 0 stopped by a signal; 64 the words of the call are off; 69 another
+one serves the socket; 71 the socket cannot be had; 78 the device root is none.)";
+
+Descriptor open_signals() {
+  std::signal(SIGPIPE, SIG_IGN);
+  sigset_t set;
+  sigemptyset(&set);
+  sigaddset(&set, SIGTERM);
+  sigaddset(&set, SIGINT);
+  ::sigprocmask(SIG_BLOCK, &set, nullptr);
+  return Descriptor(::signalfd(-1, &set, SFD_CLOEXEC | SFD_NONBLOCK));
+}
+
+platform::host::ListeningSocket open_listener() {
+  for (const char* directory : {"/run", wire::kServiceDirectory.data()}) {
+    if (platform::make_directory(directory, 0755) != 0 && errno != EEXIST) {
+      throw Failure{kSystemError, std::string("cannot make ") + directory + ": " + std::strerror(errno)};
+    }
+  }
+  platform::host::ListeningSocket listener = platform::host::ListeningSocket::open(wire::kTelephonySocket);
+  if (listener) return listener;
+  const std::string path = std::string(wire::kServiceDirectory) + '/' + std::string(wire::kTelephonySocket);
+  if (errno == EADDRINUSE) throw Failure{kServiceUnavailable, "a telephony service is running already on " + path};
+  throw Failure{kSystemError, "cannot serve " + path + ": " + std::strerror(errno)};
+}
+
+void serve() {
+  const Descriptor signals = open_signals();
+  if (!signals) throw Failure{kSystemError, std::string("cannot watch signals: ") + std::strerror(errno)};
+  Server server(open_listener());
+  std::puts("telvane-sim: ready, without a SIM");
+  std::fflush(stdout);
+  platform::report_ready();
+  server.run(signals.get());
+}
+
+int run(int count, char** words) {
+  CLI::App app("A telephony service for machines without a modem.", "telvane-sim");
+  std::string root;
+  app.footer(kFooter);
+  app.set_version_flag("--version", QUORVEL_VERSION);
+  app.add_option("--root", root, "Device root: the directory that stands for the device's / (default: QUORVEL_ROOT)")
+      ->type_name("")
+      ->option_text("DIR");
+  try {
+    app.parse(count, words);
+  } catch (const CLI::ParseError& error) {
+    if (error.get_exit_code() == 0) return app.exit(error);
+    throw Failure{kUsage, std::string(error.what()) + ". See: telvane-sim --help"};
+  }
+  use_device_root(root, kConfiguration);
+  serve();
+  return 0;
+}
+
+}  // namespace
+}  // namespace quorvel::tools
+
+int main(int count, char** words) {
+  try {
+    return quorvel::tools::run(count, words);
+  } catch (const quorvel::tools::Failure& failure) {
+    std::fprintf(stderr, "telvane-sim: %s\n", failure.message.c_str());
+    return failure.status;
+  } catch (const std::bad_alloc&) {
+    std::fputs("telvane-sim: memory does not suffice\n", stderr);
+    return quorvel::tools::kSystemError;
+  }
+}

@@ -1,0 +1,71 @@
+// One connection of the simulator: an observer, or somebody who commands.
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <deque>
+#include <optional>
+#include <string>
+
+#include "platform/descriptor.h"
+#include "platform/wire/frame.h"
+#include "sim_state.h"
+
+namespace quorvel::tools {
+
+/// A notification that somebody asked for and that is not yet sent in full.
+struct NotifyJob {
+  std::string name;
+  std::uint64_t left;
+  std::uint64_t serial;
+  bool wants_reply;
+};
+
+class Peer {
+ public:
+  using Clock = std::chrono::steady_clock;
+
+  /// `may_command`: whether the process on the other end is trusted to change the state.
+  Peer(Descriptor connection, bool may_command) noexcept
+      : connection_(std::move(connection)), may_command_(may_command) {}
+
+  [[nodiscard]] int descriptor() const noexcept { return connection_.get(); }
+  [[nodiscard]] bool may_command() const noexcept { return may_command_; }
+
+  /// Reads what has arrived. False when the connection is of no more use.
+  [[nodiscard]] bool receive();
+  /// The next call that has arrived in full, valid until the next `receive`. `refused` when what came is no call.
+  [[nodiscard]] wire::FrameResult next_call(wire::Frame& frame) noexcept;
+
+  /// Adds a frame to what is to be sent, and sends as much as goes at once. False when the connection is broken.
+  [[nodiscard]] bool send(SharedFrame frame);
+  [[nodiscard]] bool flush();
+
+  /// True when so much waits to be sent that nothing should be added.
+  [[nodiscard]] bool is_behind() const noexcept { return waiting_bytes_ > kWaitingBound; }
+  [[nodiscard]] bool has_waiting() const noexcept { return !waiting_.empty(); }
+  /// When a peer that does not read has had its time; for a peer that something waits for.
+  [[nodiscard]] Clock::time_point deadline() const noexcept { return progress_ + kPatience; }
+  /// True when the other end sends nothing more.
+  [[nodiscard]] bool ended() const noexcept { return ended_; }
+
+  /// Set by the first call: from then on the peer is sent replies only.
+  bool commands = false;
+  std::optional<NotifyJob> job;
+
+ private:
+  static constexpr std::size_t kWaitingBound = 1u << 20;
+  static constexpr auto kPatience = std::chrono::seconds(5);
+
+  Descriptor connection_;
+  bool may_command_;
+  bool ended_ = false;
+  ByteBuffer received_;
+  std::size_t taken_ = 0;
+  std::deque<SharedFrame> waiting_;
+  std::size_t sent_of_first_ = 0;
+  std::size_t waiting_bytes_ = 0;
+  Clock::time_point progress_ = Clock::now();
+};
+
+}  // namespace quorvel::tools

@@ -1,0 +1,193 @@
+#include "server.h"
+
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+
+#include "common/telephony_names.h"
+#include "platform/property/binary.h"
+#include "platform/wire/failure.h"
+#include "platform/wire/telephony_state.h"
+
+namespace quorvel::tools {
+namespace {
+
+constexpr std::size_t kMaximumPeers = 256;
+constexpr int kRetryMilliseconds = 100;
+constexpr int kEventsPerTurn = 1000;
+
+// Whoever may connect may observe; the state is changed by the simulator's own user and by root.
+bool is_trusted(int connection) noexcept {
+  ucred peer{};
+  socklen_t size = sizeof peer;
+  if (::getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return false;
+  return peer.uid == 0 || peer.uid == ::geteuid();
+}
+
+SharedFrame reply_frame(std::uint64_t serial, const PropertyValue& value) {
+  auto frame = std::make_shared<ByteBuffer>();
+  return wire::append_frame(wire::FrameKind::reply, 0, serial, {}, value, *frame) ? frame : nullptr;
+}
+
+SharedFrame failure_frame(std::uint64_t serial, const std::string& description) {
+  PropertyValue failure = PropertyValue::dictionary(2);
+  auto frame = std::make_shared<ByteBuffer>();
+  const bool built = failure.set(wire::kFailureCodeKey, PropertyValue::integer(wire::kRefusedArgument)) &&
+                     failure.set(wire::kFailureDescriptionKey, PropertyValue::string(description)) &&
+                     wire::append_frame(wire::FrameKind::failure, 0, serial, {}, failure, *frame);
+  return built ? frame : nullptr;
+}
+
+}  // namespace
+
+void Server::run(int signals) {
+  for (;;) {
+    std::vector<pollfd> waits = interests(signals);
+    if (::poll(waits.data(), waits.size(), wait_milliseconds()) < 0) continue;
+    if (waits[0].revents != 0) return;
+    std::size_t next = 2;
+    for (auto peer = peers_.begin(); peer != peers_.end(); ++next) {
+      const bool stays = waits[next].revents == 0 || serve(*peer, waits[next].revents);
+      peer = stays ? std::next(peer) : peers_.erase(peer);
+    }
+    carry_on_jobs();
+    drop_the_slow();
+    // Last, so that those who came stand in no list of waits yet.
+    out_of_descriptors_ = false;
+    if (waits[1].revents != 0) accept_all();
+  }
+}
+
+std::vector<pollfd> Server::interests(int signals) const {
+  std::vector<pollfd> waits;
+  waits.reserve(peers_.size() + 2);
+  waits.push_back({signals, POLLIN, 0});
+  const bool accepts = peers_.size() < kMaximumPeers && !out_of_descriptors_;
+  waits.push_back({accepts ? listener_.get() : -1, POLLIN, 0});
+  for (const Peer& peer : peers_) {
+    const bool reads = !peer.ended() && !peer.job && !peer.is_behind();
+    waits.push_back(
+        {peer.descriptor(), static_cast<short>((reads ? POLLIN : 0) | (peer.has_waiting() ? POLLOUT : 0)), 0});
+  }
+  return waits;
+}
+
+int Server::wait_milliseconds() const {
+  auto wait = std::chrono::milliseconds(out_of_descriptors_ ? kRetryMilliseconds : -1);
+  const auto now = Peer::Clock::now();
+  for (const Peer& peer : peers_) {
+    // A job that did not end in this turn goes on as soon as the observers allow it.
+    if (peer.job && observers_keep_up()) return 0;
+    if (!peer.has_waiting()) continue;
+    const auto left =
+        std::max(std::chrono::ceil<std::chrono::milliseconds>(peer.deadline() - now), std::chrono::milliseconds(0));
+    wait = wait.count() < 0 ? left : std::min(wait, left);
+  }
+  return static_cast<int>(wait.count());
+}
+
+void Server::accept_all() {
+  while (peers_.size() < kMaximumPeers) {
+    Descriptor connection(::accept4(listener_.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    if (!connection) {
+      if (errno == EINTR || errno == ECONNABORTED) continue;
+      out_of_descriptors_ = errno != EAGAIN;
+      return;
+    }
+    const bool trusted = is_trusted(connection.get());
+    Peer& peer = peers_.emplace_back(std::move(connection), trusted);
+    if (!peer.send(state_.state_frame())) peers_.pop_back();
+  }
+}
+
+bool Server::serve(Peer& peer, short events) {
+  if ((events & POLLOUT) != 0 && (!peer.flush() || !carry_out_calls(peer))) return false;
+  if ((events & POLLIN) != 0) {
+    if (!peer.receive() || !carry_out_calls(peer)) return false;
+  } else if ((events & (POLLHUP | POLLERR)) != 0) {
+    return false;
+  }
+  return !peer.ended() || peer.job || peer.has_waiting();
+}
+
+// One call at a time: while a notification is on its way, what follows it waits.
+bool Server::carry_out_calls(Peer& peer) {
+  wire::Frame call;
+  while (!peer.job && !peer.is_behind()) {
+    const wire::FrameResult result = peer.next_call(call);
+    if (result == wire::FrameResult::incomplete) return true;
+    if (result == wire::FrameResult::refused || !carry_out(peer, call)) return false;
+  }
+  return true;
+}
+
+bool Server::carry_out(Peer& peer, const wire::Frame& call) {
+  peer.commands = true;
+  if (!peer.may_command()) return answer(peer, call, {}, "only the simulator's own user may command it");
+  const PropertyValue argument =
+      call.payload.empty() ? PropertyValue() : read_binary(call.payload, Mutability::immutable);
+  if (!argument && !call.payload.empty()) return answer(peer, call, {}, "the argument cannot be read");
+  if (call.name == wire::kShowCommand) return answer(peer, call, state_.value(), {});
+  if (call.name == wire::kNotifyCommand) return start_notify(peer, call, argument);
+  if (call.name == wire::kSetCommand || call.name == wire::kFailCommand || call.name == wire::kSucceedCommand) {
+    return answer(peer, call, {}, state_.change(call.name, argument));
+  }
+  return answer(peer, call, {}, "there is no such command");
+}
+
+bool Server::start_notify(Peer& peer, const wire::Frame& call, const PropertyValue& argument) {
+  const std::string name(argument.get(wire::kCommandNameKey.text()).text());
+  const PropertyValue& count = argument.get(wire::kCommandCountKey.text());
+  if (!is_telephony_notification(name)) return answer(peer, call, {}, "there is no such notification");
+  if (count && !count.to_uint64()) return answer(peer, call, {}, "the count is no positive integer");
+  const bool wants_reply = (call.head.flags & wire::kFlagNoReply) == 0;
+  peer.job = NotifyJob{name, count ? *count.to_uint64() : 1, call.head.serial, wants_reply};
+  return true;
+}
+
+bool Server::answer(Peer& peer, const wire::Frame& call, const PropertyValue& value, const std::string& refusal) {
+  if ((call.head.flags & wire::kFlagNoReply) != 0) return true;
+  return peer.send(refusal.empty() ? reply_frame(call.head.serial, value) : failure_frame(call.head.serial, refusal));
+}
+
+// Sends what was asked for, as far as the observers keep up, but for no longer than a turn.
+void Server::carry_on_jobs() {
+  int events = 0;
+  for (auto peer = peers_.begin(); peer != peers_.end();) {
+    bool stays = true;
+    while (stays && peer->job && observers_keep_up() && events < kEventsPerTurn) {
+      if (peer->job->left > 0) {
+        --peer->job->left;
+        ++events;
+        send_event(peer->job->name);
+        continue;
+      }
+      const NotifyJob done = *std::exchange(peer->job, std::nullopt);
+      stays = (!done.wants_reply || peer->send(reply_frame(done.serial, {}))) && carry_out_calls(*peer);
+      stays = stays && (!peer->ended() || peer->job || peer->has_waiting());
+    }
+    peer = stays ? std::next(peer) : peers_.erase(peer);
+  }
+}
+
+void Server::send_event(const std::string& name) {
+  const SharedFrame frame = state_.event_frame(name);
+  // A broken connection is found and dropped by the next wait.
+  for (Peer& peer : peers_) {
+    if (!peer.commands) static_cast<void>(peer.send(frame));
+  }
+}
+
+void Server::drop_the_slow() {
+  const auto now = Peer::Clock::now();
+  peers_.remove_if([now](const Peer& peer) { return peer.has_waiting() && peer.deadline() <= now; });
+}
+
+bool Server::observers_keep_up() const {
+  return std::none_of(peers_.begin(), peers_.end(),
+                      [](const Peer& peer) { return !peer.commands && peer.is_behind(); });
+}
+
+}  // namespace quorvel::tools
