@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include "kept_ark.h"
 #include "log/daemon_log.h"
 #include "store/data_ark.h"
 #include "store/standard_key_classes.h"
@@ -19,7 +20,7 @@ TEST(DataArkFile, HoldsWhatIsNeitherInClassOneNorSeven) {
                                       {"-DebugDockPresent", true},
                                       {"-kept", array({1, 2})},
                                       {"com.Orvane.mobile.halvard.paired_hosts-old", "host"}}));
-  DataArk* ark = data_ark_load();
+  DataArk* ark = load_kept_ark();
   apply_standard_key_classes(ark);
   EXPECT_EQ(data_ark_copy(ark, nullptr, text("PhoneNumber")), text("1")) << "what is not saved again can be read";
   EXPECT_EQ(data_ark_copy(ark, text("com.Orvane.mobile.backup"), text("Version")), text("2.0"));
@@ -41,7 +42,7 @@ TEST(DataArkFile, AFailedSaveLeavesTheFileAndIsTold) {
   ScratchRoot root;
   const PropertyValue before = dictionary({{"-kept", 1}});
   root.write_plist(kFile, before);
-  DataArk* ark = data_ark_load();
+  DataArk* ark = load_kept_ark();
   data_ark_set(ark, nullptr, text("new"), text("x"));
   root.expect_log({"data_ark_set: dirtied by changing -new"});
   root.make_directory(kTemporary);
@@ -86,7 +87,7 @@ TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
     root.write_file(kSetAside, "older");
     put(root);
     const std::string content = std::string(name) == "directory" ? "" : root.read_file(kFile);
-    DataArk* ark = data_ark_load();
+    DataArk* ark = load_kept_ark();
     EXPECT_EQ(root.log_lines().back(), "data_ark_load: Could not load " + kFile) << name;
     data_ark_store(ark);
     EXPECT_EQ(root.log_lines().back(), "data_ark_store: " + kFile + " could not be loaded, left it where it is");
@@ -106,7 +107,7 @@ TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
 TEST(DataArkFile, AMissingFileIsOneLineAndNothingElse) {
   ScratchRoot root;
   root.make_directory(kStateDirectory);
-  DataArk* ark = data_ark_load();
+  DataArk* ark = load_kept_ark();
   EXPECT_EQ(root.log_lines().back(), "data_ark_load: Could not load " + kFile);
   data_ark_store(ark);
   EXPECT_FALSE(root.exists(kFile));

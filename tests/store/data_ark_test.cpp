@@ -5,6 +5,7 @@
 #include <atomic>
 #include <thread>
 
+#include "kept_ark.h"
 #include "log/daemon_log.h"
 #include "store/data_ark_record.h"
 #include "support/scratch_root.h"
@@ -18,7 +19,7 @@ class DataArkTest : public testing::Test {
  protected:
   DataArkTest() {
     root_.make_directory(kStateDirectory);
-    ark_ = data_ark_load();
+    ark_ = load_kept_ark();
     static_cast<void>(root_.log_lines());
   }
   std::uint32_t change_count() {

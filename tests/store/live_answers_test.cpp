@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "kept_ark.h"
 #include "store/data_ark.h"
 #include "support/scratch_root.h"
 #include "support/values.h"
@@ -46,7 +47,7 @@ TEST(LiveAnswers, QuestionsAndTheirNames) {
 TEST(LiveAnswers, AreAskedAnewAndNeverStored) {
   ScratchRoot root;
   root.make_directory(kStateDirectory);
-  DataArk* ark = data_ark_load();
+  DataArk* ark = load_kept_ark();
   const auto answer = [&](const char* version) {
     root.write_plist("/etc/quorvel/device_information.plist", dictionary({{"ProductVersion", version}}));
     return data_ark_copy(ark, nullptr, text("ProductVersion"));
