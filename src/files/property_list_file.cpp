@@ -12,6 +12,7 @@
 #include "platform/flush_file.h"
 #include "platform/lock.h"
 #include "platform/property/binary.h"
+#include "platform/property/encoded.h"
 
 namespace quorvel {
 namespace {
@@ -83,7 +84,8 @@ PropertyValue read_value(const Descriptor& file, const char* path, std::size_t s
     daemon_log(0, kLoad, "Could not read %s: %s", path, error.text());
     return {};
   }
-  PropertyValue value = read_binary(buffer.bytes(), mutability);
+  PropertyValue value =
+      mutability == Mutability::immutable ? read_encoded(std::move(buffer)) : read_binary(buffer.bytes(), mutability);
   if (!value) daemon_log(0, kLoad, "Could not create dictionary from stream");
   return value;
 }

@@ -7,29 +7,16 @@ namespace quorvel {
 
 namespace {
 
-// A new key joins the classes of its domain. The classes it joined are added to `joined`; false when memory runs out.
-bool inherit_classes(DataArk& ark, const StoreKey& key, unsigned& joined) noexcept QUORVEL_REQUIRES(ark.lock) {
-  if (!key.has_key()) return true;
-  const HashedKey domain(key.domain_text());
-  for (unsigned i = 0; i < kClassCount; ++i) {
-    if (!ark.is_in_class(domain, i) || ark.is_in_class(key.hashed(), i)) continue;
-    if (!ark.add_to_class(key.hashed(), i)) return false;
-    joined |= 1u << i;
-  }
-  return true;
-}
-
-void leave_classes(DataArk& ark, const StoreKey& key, unsigned which) noexcept QUORVEL_REQUIRES(ark.lock) {
-  for (unsigned i = 0; i < kClassCount; ++i) {
-    if ((which & 1u << i) != 0) static_cast<void>(ark.classes[i].remove(key.hashed()));
-  }
-}
-
-// Adds an entry that is not there. False, and nothing changed, when memory runs out.
-bool insert(DataArk& ark, const StoreKey& key, const PropertyValue& value) noexcept QUORVEL_REQUIRES(ark.lock) {
+// Adds an entry that is not there; it joins the classes of its domain. False, and nothing changed, when memory runs
+// out.
+bool insert(DataArk& ark, const StoreKey& key, PropertyValue value) noexcept QUORVEL_REQUIRES(ark.lock) {
   unsigned joined = 0;
-  if (inherit_classes(ark, key, joined) && ark.values.set(key.hashed(), value)) return true;
-  leave_classes(ark, key, joined);
+  if (key.has_key() && ark.class_marks.size() > 0) {
+    joined = ark.classes_of(key.domain_text()) & ~ark.classes_of(key.hashed());
+    if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
+  }
+  if (ark.values.add(key.hashed(), std::move(value))) return true;
+  if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
 }
 
@@ -62,11 +49,11 @@ int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue&
   if (PropertyValue* slot = ark->values.slot(store_key.hashed())) {
     changed = !(*slot == value);
     std::swap(*slot, stored);
-  } else if (!insert(*ark, store_key, value)) {
+  } else if (!insert(*ark, store_key, std::move(stored))) {
     return -1;
   }
   post_set_events(*ark, store_key, changed);
-  if (changed && !ark->is_unsaved(store_key.hashed()) && !ark->is_in_class(store_key.hashed(), kQuietSetClass)) {
+  if (changed && (ark->classes_of(store_key.hashed()) & kUncountedSet) == 0) {
     daemon_log(0, "data_ark_set", "dirtied by changing %s", store_key.text());
     ++ark->change_count;
   }
@@ -82,8 +69,8 @@ int data_ark_remove_extended(DataArk* ark, const PropertyValue& domain, const Pr
   if (!ark->values) return -1;
   if (!ark->values.get(store_key.hashed())) return 0;
   removed = ark->values.remove(store_key.hashed());
-  const bool counts = !ark->is_unsaved(store_key.hashed());
-  if (clear_classes == 1) leave_classes(*ark, store_key, (1u << kClassCount) - 1);
+  const bool counts = (ark->classes_of(store_key.hashed()) & kUnsaved) == 0;
+  if (clear_classes == 1) ark->remove_from_classes(store_key.hashed(), kAllClasses);
   ark->post(kOnRemoved, store_key.hashed());
   if (counts) {
     if (extended_logging != 0) {

@@ -28,12 +28,15 @@ bool file_is_there(const char* path) noexcept {
   return platform::file_status(path, &status) == 0 || (errno != ENOENT && errno != ENOTDIR);
 }
 
-// The entries that a save writes; none when memory runs out.
+// The entries that a save writes; none when memory runs out. They are the values themselves where no key is left out,
+// else a copy without the keys that are, which are few.
 PropertyValue copy_saved_entries(const DataArk& ark) noexcept QUORVEL_REQUIRES(ark.lock) {
-  PropertyValue saved = PropertyValue::dictionary(ark.values.size());
-  if (!saved) return nullptr;
-  for (const auto& [key, value] : ark.values.entries()) {
-    if (!ark.is_unsaved(key.text()) && !saved.set(key, value)) return nullptr;
+  if (!ark.values) return PropertyValue::dictionary();
+  PropertyValue saved = ark.values;
+  for (const auto& [key, marks] : ark.class_marks.entries()) {
+    if ((static_cast<unsigned>(marks.to_int64().value_or(0)) & kUnsaved) == 0) continue;
+    const HashedKey hashed(key.text());
+    if (saved.get(hashed) && !saved.remove(hashed)) return nullptr;
   }
   return saved;
 }

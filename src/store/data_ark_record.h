@@ -11,10 +11,16 @@
 namespace quorvel {
 
 inline constexpr unsigned kClassCount = 9;
-/// Classes that the store itself interprets: neither saved nor counted, and uncounted when set.
+[[nodiscard]] constexpr unsigned class_bit(unsigned key_class) noexcept { return 1u << key_class; }
+inline constexpr unsigned kAllClasses = (1u << kClassCount) - 1;
+
+// The classes that the store itself interprets.
 inline constexpr unsigned kMemoryOnlyClass = 1;
 inline constexpr unsigned kQuietSetClass = 5;
 inline constexpr unsigned kVolatileClass = 7;
+/// Keys that a save leaves out and whose changes do not count; keys whose changes by a set do not count.
+inline constexpr unsigned kUnsaved = class_bit(kMemoryOnlyClass) | class_bit(kVolatileClass);
+inline constexpr unsigned kUncountedSet = kUnsaved | class_bit(kQuietSetClass);
 
 /// The registries in the order they are kept: set, changed, removed.
 enum Registry : unsigned { kOnSet, kOnChanged, kOnRemoved, kRegistryCount };
@@ -25,22 +31,22 @@ class DataArk {
   std::uint32_t change_count QUORVEL_GUARDED_BY(lock) = 0;
   // A dictionary from store key to value; none until the file is loaded or the first value is set.
   PropertyValue values QUORVEL_GUARDED_BY(lock);
-  // Dictionaries used as sets of store keys; none until their first member.
-  std::array<PropertyValue, kClassCount> classes QUORVEL_GUARDED_BY(lock);
+  // The nine key classes: a dictionary from store key to a mask of the classes it belongs to, so that one look-up
+  // answers for all of them; none until the first mark.
+  PropertyValue class_marks QUORVEL_GUARDED_BY(lock);
   // Dictionaries from store key to notification name; none until their first registration.
   std::array<PropertyValue, kRegistryCount> registries QUORVEL_GUARDED_BY(lock);
   // The data file was there at the load but could not be used: it may hold what must not be lost.
   bool file_is_unreadable QUORVEL_GUARDED_BY(lock) = false;
 
-  [[nodiscard]] bool is_in_class(const HashedKey& key, unsigned key_class) const noexcept QUORVEL_REQUIRES(lock) {
-    return key_class < kClassCount && classes[key_class].size() > 0 && classes[key_class].get(key);
+  /// The classes that a store key belongs to, as a mask of `class_bit`s.
+  [[nodiscard]] unsigned classes_of(const HashedKey& key) const noexcept QUORVEL_REQUIRES(lock) {
+    return static_cast<unsigned>(class_marks.get(key).to_int64().value_or(0));
   }
-  /// True for the keys that a save leaves out and whose changes do not count.
-  [[nodiscard]] bool is_unsaved(const HashedKey& key) const noexcept QUORVEL_REQUIRES(lock) {
-    return is_in_class(key, kMemoryOnlyClass) || is_in_class(key, kVolatileClass);
-  }
-  /// False when memory runs out.
-  [[nodiscard]] bool add_to_class(const HashedKey& key, unsigned key_class) noexcept QUORVEL_REQUIRES(lock);
+  /// Marks a store key with classes it does not belong to yet. False when memory runs out.
+  [[nodiscard]] bool add_to_classes(const HashedKey& key, unsigned classes) noexcept QUORVEL_REQUIRES(lock);
+  /// Takes marks away from a store key.
+  void remove_from_classes(const HashedKey& key, unsigned classes) noexcept QUORVEL_REQUIRES(lock);
   /// Posts the name that is registered for an event under a store key, if there is one.
   void post(Registry event, const HashedKey& key) const noexcept QUORVEL_REQUIRES(lock);
 };

@@ -3,10 +3,20 @@
 
 namespace quorvel {
 
-bool DataArk::add_to_class(const HashedKey& key, unsigned key_class) noexcept {
-  PropertyValue& members = classes[key_class];
-  if (!members) members = PropertyValue::dictionary();
-  return members.get(key) || members.set(key, PropertyValue::boolean(true));
+bool DataArk::add_to_classes(const HashedKey& key, unsigned classes) noexcept {
+  const unsigned before = classes_of(key);
+  if ((classes & ~before) == 0) return true;
+  if (!class_marks) class_marks = PropertyValue::dictionary();
+  return class_marks.set(key, PropertyValue::integer(before | classes));
+}
+
+void DataArk::remove_from_classes(const HashedKey& key, unsigned classes) noexcept {
+  const unsigned left = classes_of(key) & ~classes;
+  if (left == 0) {
+    static_cast<void>(class_marks.remove(key));
+  } else if (PropertyValue* marks = class_marks.slot(key)) {
+    *marks = PropertyValue::integer(left);
+  }
 }
 
 int data_ark_add_to_class(DataArk* ark, const PropertyValue& domain, const PropertyValue& key,
@@ -15,7 +25,7 @@ int data_ark_add_to_class(DataArk* ark, const PropertyValue& domain, const Prope
   const StoreKey store_key(domain, key);
   if (!store_key) return -1;
   const LockHold hold(ark->lock);
-  return ark->add_to_class(store_key.hashed(), key_class) ? 0 : -1;
+  return ark->add_to_classes(store_key.hashed(), class_bit(key_class)) ? 0 : -1;
 }
 
 }  // namespace quorvel

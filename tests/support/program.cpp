@@ -14,6 +14,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
@@ -49,7 +50,7 @@ std::string content_of(const Descriptor& file) {
 
 // The datagram socket on which a service manager hears of its service.
 Descriptor notification_socket(std::string& path) {
-  static int made = 0;
+  static std::atomic<int> made = 0;
   const auto name = "quorvel-ready-" + std::to_string(::getpid()) + "-" + std::to_string(made++);
   path = std::filesystem::temp_directory_path() / name;
   sockaddr_un address{};

@@ -17,6 +17,10 @@ namespace quorvel::platform::host {
 
 namespace {
 
+// A new client waits behind everybody in the queue, those who have left again included, so a longer queue lets clients
+// that come and go in a loop delay the others for longer. Whom it does not hold tries again.
+constexpr int kBacklog = 256;
+
 // The socket is made under this suffix and renamed when it is ready.
 constexpr std::string_view kUnfinishedSuffix = ".new";
 
@@ -26,10 +30,12 @@ struct LocalAddress {
   [[nodiscard]] const sockaddr* get() const noexcept { return reinterpret_cast<const sockaddr*>(&address); }
 };
 
-[[nodiscard]] bool make_address(int directory, std::string_view name, LocalAddress& out) noexcept {
+// The address of an open object, or with a name, of an entry of an open directory.
+[[nodiscard]] bool make_address(int descriptor, std::string_view name, LocalAddress& out) noexcept {
   out.address.sun_family = AF_UNIX;
-  const int length = std::snprintf(out.address.sun_path, sizeof out.address.sun_path, "/proc/self/fd/%d/%.*s",
-                                   directory, static_cast<int>(name.size()), name.data());
+  const int length =
+      std::snprintf(out.address.sun_path, sizeof out.address.sun_path, "/proc/self/fd/%d%s%.*s", descriptor,
+                    name.empty() ? "" : "/", static_cast<int>(name.size()), name.data());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof out.address.sun_path) {
     errno = ENAMETOOLONG;
     return false;
@@ -50,7 +56,7 @@ struct LocalAddress {
     errno = EEXIST;
     return false;
   }
-  if (connect_local(directory, name)) {
+  if (connect_local(name)) {
     errno = EADDRINUSE;
     return false;
   }
@@ -68,9 +74,19 @@ Descriptor open_service_directory() noexcept {
   return Descriptor(open_file(path, O_PATH | O_DIRECTORY, 0));
 }
 
-Descriptor connect_local(int directory, std::string_view name) noexcept {
+// The socket itself is opened for its address: a link in its place is then taken inside the device root.
+Descriptor connect_local(std::string_view name) noexcept {
+  char path[kPathSize];
+  const int length =
+      std::snprintf(path, sizeof path, "%.*s/%.*s", static_cast<int>(wire::kServiceDirectory.size()),
+                    wire::kServiceDirectory.data(), static_cast<int>(name.size()), name.data());
+  if (length < 0 || static_cast<std::size_t>(length) >= sizeof path) {
+    errno = ENAMETOOLONG;
+    return Descriptor();
+  }
+  const Descriptor file(open_file(path, O_PATH, 0));
   LocalAddress address;
-  if (!make_address(directory, name, address)) return Descriptor();
+  if (!file || !make_address(file.get(), {}, address)) return Descriptor();
   Descriptor socket = make_socket();
   if (!socket) return socket;
   int result = ::connect(socket.get(), address.get(), address.length);
@@ -78,8 +94,8 @@ Descriptor connect_local(int directory, std::string_view name) noexcept {
   return result == 0 || errno == EISCONN ? std::move(socket) : Descriptor();
 }
 
-bool is_served(int directory, std::string_view name) noexcept {
-  return connect_local(directory, name) || errno == EAGAIN;
+bool is_served(std::string_view name) noexcept {
+  return connect_local(name) || errno == EAGAIN;
 }
 
 ListeningSocket& ListeningSocket::operator=(ListeningSocket&& other) noexcept {
@@ -105,7 +121,7 @@ bool ListeningSocket::bind_and_listen(std::string_view name) noexcept {
   // ready for use, and in place of a stale one at the same moment.
   if (::fchmodat(directory_.get(), unfinished, 0666, 0) != 0 ||
       ::fstatat(directory_.get(), unfinished, &status, AT_SYMLINK_NOFOLLOW) != 0 ||
-      ::listen(socket_.get(), SOMAXCONN) != 0 ||
+      ::listen(socket_.get(), kBacklog) != 0 ||
       ::renameat(directory_.get(), unfinished, directory_.get(), name_) != 0) {
     const int error = errno;
     ::unlinkat(directory_.get(), unfinished, 0);

@@ -15,12 +15,12 @@ namespace quorvel::platform::host {
 /// The service directory inside the device root, for addressing what lies in it; empty with errno set.
 [[nodiscard]] Descriptor open_service_directory() noexcept;
 
-/// A connection, not blocking, to the socket `name` in `directory`; empty with errno set. Never waits: a listener whose
-/// queue is full gives EAGAIN.
-[[nodiscard]] Descriptor connect_local(int directory, std::string_view name) noexcept;
+/// A connection, not blocking, to the socket `name` in the service directory; empty with errno set. Never waits: a
+/// listener whose queue is full gives EAGAIN.
+[[nodiscard]] Descriptor connect_local(std::string_view name) noexcept;
 
-/// True when somebody listens on the socket `name` in `directory`.
-[[nodiscard]] bool is_served(int directory, std::string_view name) noexcept;
+/// True when somebody listens on the socket `name` in the service directory.
+[[nodiscard]] bool is_served(std::string_view name) noexcept;
 
 /// A listening socket. One that made its own file takes the file away when it ends, unless another file has its name by
 /// then.

@@ -35,6 +35,8 @@ bool NotificationServer::start() noexcept {
     }
   }
   socket_ = ListeningSocket();
+  wake_ = Descriptor();
+  epoll_ = Descriptor();
   return false;
 }
 

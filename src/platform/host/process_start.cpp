@@ -68,8 +68,7 @@ void bound_idle_memory() noexcept {
   char name[NAME_MAX + 1];
   const int length = std::snprintf(name, sizeof name, "%.*s%s", static_cast<int>(service_name.size()),
                                    service_name.data(), wire::kSocketSuffix.data());
-  const Descriptor directory = host::open_service_directory();
-  if (length < 0 || !directory || !host::is_served(directory.get(), name)) return 0;
+  if (length < 0 || !host::is_served(name)) return 0;
   host::print_error_line("another process serves %s", name);
   return EX_UNAVAILABLE;
 }
@@ -95,8 +94,9 @@ int start_process(std::string_view service_name) noexcept {
     host::print_system_error("cannot make the run loop");
     return EX_OSERR;
   }
-  int status = host::take_instance_lock();
-  if (status == 0) status = refuse_served_socket(service_name);
+  // The socket is asked about first: the lock of another user's instance cannot even be opened.
+  int status = refuse_served_socket(service_name);
+  if (status == 0) status = host::take_instance_lock();
   if (status == 0) host::start_notification_server();
   return status;
 }

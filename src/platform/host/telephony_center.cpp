@@ -33,7 +33,8 @@ bool TelephonyCenter::start() noexcept {
 void TelephonyCenter::bind(RunLoop* loop) noexcept {
   if (loop == nullptr || loop_ != nullptr) return;
   timer_source_ = {timer_.get(), try_again, this};
-  if (!loop->add(timer_source_, EPOLLIN)) return;
+  // The service is not kept waiting for an observer that never reads.
+  if (!loop->add(timer_source_, EPOLLIN)) return stream_.close();
   loop_ = loop;
   watch_stream();
 }

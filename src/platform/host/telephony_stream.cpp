@@ -29,7 +29,7 @@ constexpr std::size_t kReceiveSize = 64u << 10;
 bool TelephonyStream::connect() noexcept {
   const Descriptor directory = open_service_directory();
   if (!directory) return false;
-  Descriptor socket = connect_local(directory.get(), wire::kTelephonySocket);
+  Descriptor socket = connect_local(wire::kTelephonySocket);
   if (!socket || !is_owned_by_peer(directory.get(), socket.get())) return false;
   close();
   socket_ = std::move(socket);

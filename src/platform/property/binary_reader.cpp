@@ -9,7 +9,7 @@
 #include <memory>
 
 #include "platform/property/binary.h"
-#include "platform/property/binary_format.h"
+#include "platform/property/binary_layout.h"
 #include "platform/property/leaf_allocator.h"
 #include "platform/property/unicode.h"
 #include "platform/property/walk.h"
@@ -25,21 +25,7 @@ namespace {
 constexpr Word kUnmade = 5;
 constexpr Word kInTheMaking = 5 | 8;
 
-struct Object {
-  std::uint8_t kind;    // the marker's high four bits
-  std::uint8_t nibble;  // its low four
-  std::uint64_t size;   // elements of a text, data or container
-  const std::byte* body;
-  const std::byte* end;
-};
-
-struct Layout {
-  std::size_t offset_size;
-  std::size_t reference_size;
-  std::uint64_t count;
-  std::uint64_t top;
-  std::uint64_t table;
-};
+using Object = EncodedObject;
 
 class Reader {
  public:
@@ -56,13 +42,6 @@ class Reader {
     std::size_t object;
     std::uint64_t next;  // reference to look at
   };
-
-  bool read_trailer() noexcept;
-  bool parse_object(std::uint64_t offset, Object& object) const noexcept;
-  bool parse_size(const std::byte* marker, Object& object) const noexcept;
-  std::uint64_t offset_of(std::size_t index) const noexcept {
-    return format::get_integer(bytes_.data() + layout_.table + index * layout_.offset_size, layout_.offset_size);
-  }
 
   bool make_leaves() noexcept;
   bool make_leaf(const Object& object, Word& word) noexcept;
@@ -81,8 +60,7 @@ class Reader {
 
   std::span<const std::byte> bytes_;
   std::uint8_t container_flags_;
-  Layout layout_{};
-  const std::byte* objects_end_ = nullptr;
+  BinaryLayout layout_;
   LeafAllocator leaves_;
   Word* words_ = nullptr;
   std::uint64_t containers_ = 0;
@@ -91,96 +69,22 @@ class Reader {
 
 Reader::~Reader() {
   if (words_ == nullptr) return;
-  for (std::uint64_t i = 0; i < layout_.count; ++i) {
+  for (std::uint64_t i = 0; i < layout_.count(); ++i) {
     if (is_node(words_[i]) && (node_of(words_[i])->flags & kInBlock) == 0) release(words_[i]);
   }
   std::free(words_);
 }
 
 PropertyValue Reader::read() noexcept {
-  if (!read_trailer()) return nullptr;
-  words_ = static_cast<Word*>(std::calloc(layout_.count, sizeof(Word)));
+  if (!layout_.parse(bytes_)) return nullptr;
+  words_ = static_cast<Word*>(std::calloc(layout_.count(), sizeof(Word)));
   if (words_ == nullptr) return nullptr;
   leaves_.start(bytes_.size());
   if (!make_leaves() || !make_containers()) return nullptr;
-  retain(words_[layout_.top]);
-  PropertyValue value = PropertyValue::adopt(words_[layout_.top]);
+  retain(words_[layout_.top()]);
+  PropertyValue value = PropertyValue::adopt(words_[layout_.top()]);
   if (shares_containers() && !is_within_limits(value)) return nullptr;
   return value;
-}
-
-bool Reader::read_trailer() noexcept {
-  if (bytes_.size() < format::kSmallestFile) return false;
-  if (std::memcmp(bytes_.data(), format::kHeader.data(), format::kHeader.size()) != 0) return false;
-  const std::uint64_t trailer_offset = bytes_.size() - format::kTrailerSize;
-  const std::byte* trailer = bytes_.data() + trailer_offset;
-  layout_.offset_size = static_cast<std::size_t>(trailer[format::kOffsetSizeAt]);
-  layout_.reference_size = static_cast<std::size_t>(trailer[format::kReferenceSizeAt]);
-  layout_.count = format::get_integer(trailer + format::kObjectCountAt, 8);
-  layout_.top = format::get_integer(trailer + format::kTopObjectAt, 8);
-  layout_.table = format::get_integer(trailer + format::kTableOffsetAt, 8);
-  const auto is_width = [](std::size_t width) { return width >= 1 && width <= 8; };
-  if (!is_width(layout_.offset_size) || !is_width(layout_.reference_size)) return false;
-  if (layout_.table <= format::kHeader.size() || layout_.table >= trailer_offset) return false;
-  if (layout_.count == 0 || layout_.count > (trailer_offset - layout_.table) / layout_.offset_size) return false;
-  objects_end_ = bytes_.data() + layout_.table;
-  return layout_.top < layout_.count;
-}
-
-// The size in a marker's nibble, or in the integer object behind it.
-bool Reader::parse_size(const std::byte* marker, Object& object) const noexcept {
-  object.body = marker + 1;
-  object.size = object.nibble;
-  if (object.nibble != format::kLongSize) return true;
-  if (object.body == objects_end_) return false;
-  const auto integer = static_cast<std::uint8_t>(*object.body++);
-  if (integer >> 4 != format::kInteger || (integer & 15) > 3) return false;
-  const std::size_t width = std::size_t{1} << (integer & 15);
-  if (static_cast<std::size_t>(objects_end_ - object.body) < width) return false;
-  object.size = format::get_integer(object.body, width);
-  object.body += width;
-  return width < 8 || object.size >> 63 == 0;
-}
-
-bool Reader::parse_object(std::uint64_t offset, Object& object) const noexcept {
-  if (offset < format::kHeader.size() || offset >= layout_.table) return false;
-  const std::byte* marker = bytes_.data() + offset;
-  object.kind = static_cast<std::uint8_t>(*marker) >> 4;
-  object.nibble = static_cast<std::uint8_t>(*marker) & 15;
-  std::size_t unit = 1;
-  object.body = marker + 1;
-  switch (object.kind) {
-    case format::kFalse >> 4:
-      object.size = 0;
-      if (object.nibble != (format::kFalse & 15) && object.nibble != (format::kTrue & 15)) return false;
-      break;
-    case format::kInteger:
-      if (object.nibble > 4) return false;
-      object.size = std::uint64_t{1} << object.nibble;
-      break;
-    case format::kReal:
-      if (object.nibble != 2 && object.nibble != 3) return false;
-      object.size = std::uint64_t{1} << object.nibble;
-      break;
-    case format::kDate >> 4:
-      if (object.nibble != (format::kDate & 15)) return false;
-      object.size = 8;
-      break;
-    case format::kUtf16Text:
-    case format::kData:
-    case format::kAsciiText:
-    case format::kArray:
-    case format::kDictionary:
-      if (!parse_size(marker, object)) return false;
-      if (object.kind == format::kUtf16Text) unit = 2;
-      if (object.kind == format::kArray) unit = layout_.reference_size;
-      if (object.kind == format::kDictionary) unit = 2 * layout_.reference_size;
-      break;
-    default: return false;
-  }
-  if (object.size > static_cast<std::uint64_t>(objects_end_ - object.body) / unit) return false;
-  object.end = object.body + object.size * unit;
-  return true;
 }
 
 // Two objects that share bytes would let a small file stand for large values.
@@ -190,17 +94,17 @@ bool Reader::objects_overlap() const noexcept {
     std::uint64_t end;
   };
   const std::unique_ptr<Extent, decltype(&std::free)> extents(
-      static_cast<Extent*>(std::malloc(layout_.count * sizeof(Extent))), &std::free);
+      static_cast<Extent*>(std::malloc(layout_.count() * sizeof(Extent))), &std::free);
   if (extents == nullptr) return true;
   Extent* const first = extents.get();
-  for (std::size_t i = 0; i < layout_.count; ++i) {
+  for (std::size_t i = 0; i < layout_.count(); ++i) {
     Object object;
-    const std::uint64_t offset = offset_of(i);
-    if (!parse_object(offset, object)) return true;
-    first[i] = {offset, static_cast<std::uint64_t>(object.end - bytes_.data())};
+    const std::uint64_t offset = layout_.offset_of(i);
+    if (!layout_.object_at(offset, object)) return true;
+    first[i] = {offset, layout_.end_of(object)};
   }
-  std::sort(first, first + layout_.count, [](const Extent& a, const Extent& b) { return a.begin < b.begin; });
-  for (std::size_t i = 1; i < layout_.count; ++i) {
+  std::sort(first, first + layout_.count(), [](const Extent& a, const Extent& b) { return a.begin < b.begin; });
+  for (std::size_t i = 1; i < layout_.count(); ++i) {
     if (first[i].begin < first[i - 1].end) return true;
   }
   return false;
@@ -209,18 +113,18 @@ bool Reader::objects_overlap() const noexcept {
 bool Reader::make_leaves() noexcept {
   bool may_overlap = true;  // until it is known that nothing does
   std::uint64_t end = 0;
-  for (std::size_t i = 0; i < layout_.count; ++i) {
+  for (std::size_t i = 0; i < layout_.count(); ++i) {
     Object object;
-    const std::uint64_t offset = offset_of(i);
-    if (!parse_object(offset, object)) return false;
+    const std::uint64_t offset = layout_.offset_of(i);
+    if (!layout_.object_at(offset, object)) return false;
     // Objects that stand in the order of their numbers are compared one by one; the first that does not has all of
     // them compared, before a leaf is made of it.
     if (may_overlap && offset < end) {
       if (objects_overlap()) return false;
       may_overlap = false;
     }
-    end = static_cast<std::uint64_t>(object.end - bytes_.data());
-    if (object.kind == format::kArray || object.kind == format::kDictionary) {
+    end = layout_.end_of(object);
+    if (object.is_container()) {
       words_[i] = kUnmade;
     } else if (!make_leaf(object, words_[i])) {
       return false;
@@ -235,10 +139,9 @@ bool Reader::make_integer(const Object& object, Word& word) noexcept {
   if (object.size <= 8) {
     value = format::get_integer(object.body, object.size);
   } else {
-    const std::uint64_t high = format::get_integer(object.body, 8);
+    if (!fits_64_bits(object)) return false;
+    is_unsigned = *object.body == std::byte{0};
     value = format::get_integer(object.body + 8, 8);
-    is_unsigned = high == 0;
-    if (!is_unsigned && (high != UINT64_MAX || value >> 63 == 0)) return false;
   }
   if (!is_unsigned || value >> 63 == 0) {
     const auto number = static_cast<std::int64_t>(value);
@@ -292,8 +195,8 @@ bool Reader::make_leaf(const Object& object, Word& word) noexcept {
 }
 
 bool Reader::take_reference(const std::byte* at, Word& word) const noexcept {
-  const std::uint64_t index = format::get_integer(at, layout_.reference_size);
-  if (index >= layout_.count) return false;
+  const std::uint64_t index = layout_.reference_at(at);
+  if (index >= layout_.count()) return false;
   word = words_[index];
   return true;
 }
@@ -301,15 +204,15 @@ bool Reader::take_reference(const std::byte* at, Word& word) const noexcept {
 // Puts the next child that must be made first on the stack; without one, makes the container on top of it.
 bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept {
   Object object;
-  if (!parse_object(offset_of(frame.object), object)) return false;
+  if (!layout_.object_at(layout_.offset_of(frame.object), object)) return false;
   const std::uint64_t references = object.size * (object.kind == format::kDictionary ? 2 : 1);
   for (; frame.next < references; ++frame.next) {
-    const std::byte* at = object.body + frame.next * layout_.reference_size;
+    const std::byte* at = object.body + frame.next * layout_.reference_size();
     Word word = 0;
     if (!take_reference(at, word) || word == kInTheMaking) return false;
     if (word == kUnmade) {
       if (depth == kMaximumDepth) return false;
-      stack[depth++] = {static_cast<std::size_t>(format::get_integer(at, layout_.reference_size)), 0};
+      stack[depth++] = {static_cast<std::size_t>(layout_.reference_at(at)), 0};
       words_[stack[depth - 1].object] = kInTheMaking;
       return true;
     }
@@ -319,11 +222,11 @@ bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noex
 }
 
 bool Reader::make_containers() noexcept {
-  if (words_[layout_.top] != kUnmade) return true;
+  if (words_[layout_.top()] != kUnmade) return true;
   Frame stack[kMaximumDepth];
   std::size_t depth = 1;
-  stack[0] = {static_cast<std::size_t>(layout_.top), 0};
-  words_[layout_.top] = kInTheMaking;
+  stack[0] = {static_cast<std::size_t>(layout_.top()), 0};
+  words_[layout_.top()] = kInTheMaking;
   while (depth > 0) {
     if (!visit_children(stack[depth - 1], stack, depth)) return false;
   }
@@ -338,7 +241,7 @@ bool Reader::make_container(const Object& object, Word& word) noexcept {
   word = word_of(array);
   for (std::uint64_t i = 0; i < object.size; ++i) {
     Word item = 0;
-    if (!take_reference(object.body + i * layout_.reference_size, item)) return false;
+    if (!take_reference(object.body + i * layout_.reference_size(), item)) return false;
     count_container(item);
     array->items()[i] = item;
   }
@@ -353,23 +256,23 @@ bool Reader::make_dictionary(const Object& object, Word& word) noexcept {
   word = word_of(dictionary);
   Entry* const entries = dictionary->entries();
   const std::byte* at = object.body;
-  const std::byte* values = object.body + object.size * layout_.reference_size;
+  const std::byte* values = object.body + object.size * layout_.reference_size();
   std::string_view before;
-  bool sorted = true;
-  for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size, values += layout_.reference_size) {
+  std::uint32_t ascending = 0;
+  for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size(), values += layout_.reference_size()) {
     Word key = 0, value = 0;
     if (!take_reference(at, key) || !take_reference(values, value)) return false;
     if (kind_of(key) != PropertyKind::string) return false;
     count_container(value);
     entries[i] = {key, value};
-    sorted = sorted && (i == 0 || before < text_of(key));
+    if (ascending == i && (i == 0 || before < text_of(key))) ++ascending;
     before = text_of(key);
   }
   retain_all(&entries->key, object.size * 2);
   dictionary->used = dictionary->live = dictionary->capacity;
-  if (!sorted) dictionary->flags = static_cast<std::uint8_t>(dictionary->flags & ~kSorted);
+  dictionary->ascending = ascending;
   // Keys in ascending order are known to differ.
-  return index_entries(*dictionary, !sorted);
+  return index_entries(*dictionary, ascending < dictionary->used);
 }
 
 }  // namespace

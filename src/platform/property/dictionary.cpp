@@ -9,6 +9,7 @@
 #include <limits>
 #include <new>
 
+#include "platform/property/unicode.h"
 #include "platform/property/value.h"
 
 namespace quorvel {
@@ -59,6 +60,11 @@ bool is_behind_last(const DictionaryNode& dictionary, std::string_view key) noex
   return true;
 }
 
+void forget_order(DictionaryNode& dictionary) noexcept {
+  if (dictionary.order.load(std::memory_order_relaxed) == nullptr) return;
+  std::free(dictionary.order.exchange(nullptr, std::memory_order_relaxed));
+}
+
 // Closes the gaps, so that every entry is live. The index is made anew, as the entries' places change.
 bool compact(DictionaryNode& dictionary) noexcept {
   IndexSlot* index = nullptr;
@@ -66,13 +72,15 @@ bool compact(DictionaryNode& dictionary) noexcept {
     index = static_cast<IndexSlot*>(std::calloc(dictionary.index_size, sizeof(IndexSlot)));
     if (index == nullptr) return false;
   }
-  std::uint32_t kept = 0;
+  std::uint32_t kept = 0, ascending = 0;
   for (std::uint32_t i = 0; i < dictionary.used; ++i) {
+    if (i == dictionary.ascending) ascending = kept;
     const Entry entry = dictionary.entries()[i];
     if (entry.key == 0) continue;
     dictionary.entries()[kept++] = entry;
     if (index != nullptr) place(index, dictionary.index_size - 1, {hash_text(text_of(entry.key)), kept});
   }
+  dictionary.ascending = dictionary.ascending == dictionary.used ? kept : ascending;
   dictionary.used = kept;
   if (index != nullptr) {
     std::free(dictionary.index);
@@ -127,8 +135,9 @@ DictionaryNode* new_dictionary(std::size_t capacity, std::uint8_t flags) noexcep
   auto* node = new (memory) DictionaryNode;
   node->count.store(1, std::memory_order_relaxed);
   node->kind = PropertyKind::dictionary;
-  node->flags = static_cast<std::uint8_t>(flags | kSorted | kInlineStorage);
-  node->used = node->live = node->index_size = 0;
+  node->flags = static_cast<std::uint8_t>(flags | kInlineStorage);
+  node->used = node->live = node->index_size = node->ascending = 0;
+  node->order.store(nullptr, std::memory_order_relaxed);
   node->capacity = static_cast<std::uint32_t>(capacity);
   node->storage = node + 1;
   node->index = nullptr;
@@ -212,9 +221,8 @@ Entry* find_entry(const DictionaryNode& dictionary, const HashedKey& key) noexce
 }
 
 void add_entry(DictionaryNode& dictionary, const HashedKey& key, Word key_word, Word value) noexcept {
-  if ((dictionary.flags & kSorted) != 0 && !is_behind_last(dictionary, key.text)) {
-    dictionary.flags = static_cast<std::uint8_t>(dictionary.flags & ~kSorted);
-  }
+  forget_order(dictionary);
+  if (dictionary.ascending == dictionary.used && is_behind_last(dictionary, key.text)) ++dictionary.ascending;
   dictionary.entries()[dictionary.used++] = {key_word, value};
   ++dictionary.live;
   if (dictionary.index_size > 0) place(dictionary.index, dictionary.index_size - 1, {key.hash, dictionary.used});
@@ -223,7 +231,7 @@ void add_entry(DictionaryNode& dictionary, const HashedKey& key, Word key_word, 
 DictionaryNode* copy_dictionary(const DictionaryNode& from) noexcept {
   DictionaryNode* copy = new_dictionary(from.used, kMutable);
   if (copy == nullptr) return nullptr;
-  copy->flags = static_cast<std::uint8_t>((copy->flags & ~kSorted) | (from.flags & kSorted));
+  copy->ascending = from.ascending;
   if (from.index_size > 0) {
     copy->index = static_cast<IndexSlot*>(std::malloc(from.index_size * sizeof(IndexSlot)));
     if (copy->index == nullptr) {
@@ -248,19 +256,20 @@ namespace {
 
 const PropertyValue kNone;
 
+// Of a value that accepts changes, which is never an encoded one.
 DictionaryNode& dictionary_of(Word word) noexcept { return *static_cast<DictionaryNode*>(node_of(word)); }
 
 }  // namespace
 
 const PropertyValue& PropertyValue::get(const HashedKey& key) const noexcept {
   if (!is_dictionary()) return kNone;
-  const Entry* entry = find_entry(dictionary_of(word_), key);
+  const Entry* entry = find_entry(dictionary_at(word_), key);
   return entry == nullptr ? kNone : borrowed(entry->value);
 }
 
 DictionaryRange PropertyValue::entries() const noexcept {
   if (!is_dictionary()) return {nullptr, nullptr};
-  const DictionaryNode& dictionary = dictionary_of(word_);
+  const DictionaryNode& dictionary = dictionary_at(word_);
   return {dictionary.entries(), dictionary.entries() + dictionary.used};
 }
 
@@ -278,18 +287,18 @@ bool PropertyValue::set(const PropertyValue& key, PropertyValue value) noexcept 
 }
 
 bool PropertyValue::set(const HashedKey& key, PropertyValue value) noexcept {
-  PropertyValue replaced;
-  return exchange(key, std::move(value), replaced);
-}
-
-bool PropertyValue::exchange(const HashedKey& key, PropertyValue value, PropertyValue& replaced) noexcept {
   if (!value || !make_unique(PropertyKind::dictionary)) return false;
-  DictionaryNode& dictionary = dictionary_of(word_);
-  if (Entry* entry = find_entry(dictionary, key)) {
-    replaced = adopt(std::exchange(entry->value, value.take()));
+  if (Entry* entry = find_entry(dictionary_of(word_), key)) {
+    std::swap(*reinterpret_cast<PropertyValue*>(&entry->value), value);
     return true;
   }
-  PropertyValue key_value = string(key.text);
+  return check_utf8(key.text) != TextCheck::invalid && add(key, std::move(value));
+}
+
+bool PropertyValue::add(const HashedKey& key, PropertyValue value) noexcept {
+  if (!value || !make_unique(PropertyKind::dictionary)) return false;
+  DictionaryNode& dictionary = dictionary_of(word_);
+  PropertyValue key_value = joined_string(key.text, {});
   if (!key_value || !make_room(dictionary)) return false;
   add_entry(dictionary, key, key_value.take(), value.take());
   return true;
@@ -304,10 +313,8 @@ PropertyValue PropertyValue::remove(const HashedKey& key) noexcept {
   PropertyValue removed = adopt(entry->value);
   release(entry->key);
   *entry = {};
-  if (--dictionary.live == 0) {
-    dictionary.used = 0;
-    dictionary.flags |= kSorted;
-  }
+  forget_order(dictionary);
+  if (--dictionary.live == 0) dictionary.used = dictionary.ascending = 0;
   return removed;
 }
 

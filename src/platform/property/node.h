@@ -44,7 +44,7 @@ enum NodeFlag : std::uint8_t {
   kStatic = 2,          // never counted, never freed
   kMutable = 4,         // accepts changes
   kAscii = 8,           // a text without a byte above 0x7f
-  kSorted = 16,         // a dictionary whose entries stand in ascending order of their keys
+  kEncoded = 16,        // a dictionary that is still its bytes: see encoded.cpp
   kUnsigned = 32,       // an integer above the signed range
   kInlineStorage = 64,  // a container whose first slots lie in its own allocation
 };
@@ -110,6 +110,10 @@ struct DictionaryNode : ContainerNode {
   };
   std::uint32_t live;        // entries that are not dead
   std::uint32_t index_size;  // 0 while the dictionary is small enough to be scanned, else a power of two
+  std::uint32_t ascending;   // this many slots from the first hold their keys in ascending order
+  // The live entries in ascending order of their keys, noted when somebody asked for it and they do not stand so;
+  // null until then, and again when a key comes or goes. Readers on several threads may note it at once.
+  mutable std::atomic<std::uint32_t*> order;
   [[nodiscard]] Entry* entries() const noexcept { return static_cast<Entry*>(storage); }
 };
 
@@ -133,6 +137,17 @@ struct DictionaryNode : ContainerNode {
   return (static_cast<Word>(value) << 3) | kIntegerTag;
 }
 [[nodiscard]] inline std::int64_t immediate_value(Word word) noexcept { return static_cast<std::int64_t>(word) >> 3; }
+
+/// The dictionary that an encoded one stands for; an empty one when memory runs out. And the end of an encoded one:
+/// returns what it stood for, whose reference the caller drops, or 0.
+[[nodiscard]] const DictionaryNode& open_encoded(const DictionaryNode& node) noexcept;
+[[nodiscard]] Word end_encoded(DictionaryNode& node) noexcept;
+
+/// The dictionary behind a word, with its entries.
+[[nodiscard]] inline const DictionaryNode& dictionary_at(Word word) noexcept {
+  const auto& node = *static_cast<const DictionaryNode*>(node_of(word));
+  return (node.flags & kEncoded) == 0 ? node : open_encoded(node);
+}
 
 /// Frees a node whose last reference is gone, and what only it referred to, without recursion.
 void destroy(Node* node) noexcept;

@@ -10,6 +10,17 @@ namespace quorvel::detail {
 
 namespace {
 
+struct Free {
+  void operator()(void* memory) const noexcept { std::free(memory); }
+};
+template <class T>
+using Row = std::unique_ptr<T, Free>;
+
+template <class T>
+Row<T> make_row(std::size_t count) noexcept {
+  return Row<T>(static_cast<T*>(std::malloc((count + 1) * sizeof(T))));
+}
+
 // An entry with the first eight bytes behind what all keys share, as a number that compares as the bytes do.
 struct SortItem {
   std::uint64_t prefix;
@@ -17,10 +28,9 @@ struct SortItem {
 };
 
 std::size_t shared_length(std::string_view left, std::string_view right) noexcept {
-  const std::size_t limit = std::min(left.size(), right.size());
-  return static_cast<std::size_t>(
-      std::mismatch(left.begin(), left.begin() + static_cast<std::ptrdiff_t>(limit), right.begin()).first -
-      left.begin());
+  const auto limit = static_cast<std::ptrdiff_t>(std::min(left.size(), right.size()));
+  return static_cast<std::size_t>(std::mismatch(left.begin(), left.begin() + limit, right.begin()).first -
+                                  left.begin());
 }
 
 std::uint64_t prefix_of(std::string_view key, std::size_t shared) noexcept {
@@ -30,45 +40,75 @@ std::uint64_t prefix_of(std::string_view key, std::size_t shared) noexcept {
   return binary_format::get_integer(bytes, 8);
 }
 
-std::uint32_t list_live(const DictionaryNode& dictionary, std::uint32_t* order) noexcept {
-  std::uint32_t live = 0;
-  for (std::uint32_t i = 0; i < dictionary.used; ++i) {
-    if (dictionary.entries()[i].key != 0) order[live++] = i;
-  }
-  return live;
-}
+class Sorter {
+ public:
+  explicit Sorter(const DictionaryNode& dictionary) noexcept : dictionary_(dictionary) {}
 
-bool sort(const Entry* entries, std::uint32_t* order, std::uint32_t count) noexcept {
-  const auto key = [&](std::uint32_t entry) { return text_of(entries[entry].key); };
-  std::size_t shared = count > 0 ? key(order[0]).size() : 0;
-  for (std::uint32_t i = 1; i < count; ++i) {
-    shared = shared_length(key(order[0]).substr(0, shared), key(order[i]));
+  // The order of all live entries, or null when memory runs out.
+  Row<std::uint32_t> sort() noexcept {
+    Row<std::uint32_t> order = make_row<std::uint32_t>(dictionary_.live);
+    if (order == nullptr) return nullptr;
+    std::uint32_t* const tail = list_live(order.get());
+    std::uint32_t* const end = order.get() + dictionary_.live;
+    if (tail == end) return order;
+    if (!sort_tail(tail, end)) return nullptr;
+    if (tail == order.get()) return order;
+    Row<std::uint32_t> merged = make_row<std::uint32_t>(dictionary_.live);
+    if (merged == nullptr) return nullptr;
+    std::merge(order.get(), tail, tail, end, merged.get(),
+               [this](std::uint32_t left, std::uint32_t right) { return key(left) < key(right); });
+    return merged;
   }
-  const std::unique_ptr<SortItem, decltype(&std::free)> items(
-      static_cast<SortItem*>(std::malloc((count + 1) * sizeof(SortItem))), &std::free);
-  if (items == nullptr) return false;
-  for (std::uint32_t i = 0; i < count; ++i) items.get()[i] = {prefix_of(key(order[i]), shared), order[i]};
-  std::sort(items.get(), items.get() + count, [&](const SortItem& left, const SortItem& right) {
-    return left.prefix != right.prefix ? left.prefix < right.prefix : key(left.entry) < key(right.entry);
-  });
-  for (std::uint32_t i = 0; i < count; ++i) order[i] = items.get()[i].entry;
-  return true;
-}
+
+ private:
+  [[nodiscard]] std::string_view key(std::uint32_t entry) const noexcept {
+    return text_of(dictionary_.entries()[entry].key);
+  }
+
+  // Lists the live entries as they stand; returns where those begin that are not known to ascend.
+  std::uint32_t* list_live(std::uint32_t* order) const noexcept {
+    std::uint32_t* tail = order;
+    for (std::uint32_t i = 0; i < dictionary_.used; ++i) {
+      if (dictionary_.entries()[i].key == 0) continue;
+      *order++ = i;
+      if (i < dictionary_.ascending) tail = order;
+    }
+    return tail;
+  }
+
+  bool sort_tail(std::uint32_t* first, std::uint32_t* last) noexcept {
+    const auto count = static_cast<std::size_t>(last - first);
+    std::size_t shared = key(*first).size();
+    for (const std::uint32_t* at = first; at != last; ++at) {
+      shared = shared_length(key(*first).substr(0, shared), key(*at));
+    }
+    const Row<SortItem> items = make_row<SortItem>(count);
+    if (items == nullptr) return false;
+    SortItem* const begin = items.get();
+    for (std::size_t i = 0; i < count; ++i) begin[i] = {prefix_of(key(first[i]), shared), first[i]};
+    std::sort(begin, begin + count, [this](const SortItem& left, const SortItem& right) {
+      return left.prefix != right.prefix ? left.prefix < right.prefix : key(left.entry) < key(right.entry);
+    });
+    for (std::size_t i = 0; i < count; ++i) first[i] = begin[i].entry;
+    return true;
+  }
+
+  const DictionaryNode& dictionary_;
+};
 
 }  // namespace
 
-SortedEntries::SortedEntries(const DictionaryNode& dictionary) noexcept : entries_(dictionary.entries()) {
-  const bool is_sorted = (dictionary.flags & kSorted) != 0;
-  if (is_sorted && dictionary.live == dictionary.used) {
-    valid_ = true;
-    return;
+SortedEntries::SortedEntries(const DictionaryNode& dictionary) noexcept : entries_(dictionary.entries()), valid_(true) {
+  if (dictionary.ascending == dictionary.used && dictionary.live == dictionary.used) return;
+  std::uint32_t* order = dictionary.order.load(std::memory_order_acquire);
+  if (order == nullptr) {
+    Row<std::uint32_t> sorted = Sorter(dictionary).sort();
+    valid_ = sorted != nullptr;
+    if (valid_ && dictionary.order.compare_exchange_strong(order, sorted.get(), std::memory_order_acq_rel)) {
+      order = sorted.release();
+    }
   }
-  order_ = static_cast<std::uint32_t*>(std::malloc((std::size_t{dictionary.live} + 1) * sizeof(std::uint32_t)));
-  if (order_ == nullptr) return;
-  const std::uint32_t live = list_live(dictionary, order_);
-  valid_ = is_sorted || sort(entries_, order_, live);
+  order_ = order;
 }
-
-SortedEntries::~SortedEntries() { std::free(order_); }
 
 }  // namespace quorvel::detail

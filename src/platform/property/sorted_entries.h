@@ -10,11 +10,9 @@ namespace quorvel::detail {
 
 class SortedEntries {
  public:
-  /// Tests false when memory runs out. The dictionary may not change or end meanwhile.
+  /// Tests false when memory runs out. The dictionary, which keeps the order it was found to have, may not change or
+  /// end meanwhile. Any thread.
   explicit SortedEntries(const DictionaryNode& dictionary) noexcept;
-  SortedEntries(const SortedEntries&) = delete;
-  SortedEntries& operator=(const SortedEntries&) = delete;
-  ~SortedEntries();
 
   [[nodiscard]] explicit operator bool() const noexcept { return valid_; }
   [[nodiscard]] const Entry& operator[](std::size_t index) const noexcept {
@@ -23,8 +21,8 @@ class SortedEntries {
 
  private:
   const Entry* entries_;
-  std::uint32_t* order_ = nullptr;  // null where the entries stand in order and without gaps
-  bool valid_ = false;
+  const std::uint32_t* order_ = nullptr;  // null where the entries stand in order and without gaps
+  bool valid_;
 };
 
 }  // namespace quorvel::detail

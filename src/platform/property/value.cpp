@@ -125,7 +125,7 @@ std::span<std::byte> PropertyValue::mutable_bytes() noexcept {
 
 std::size_t PropertyValue::size() const noexcept {
   if (kind() == PropertyKind::array) return static_cast<const ArrayNode*>(node_of(word_))->used;
-  if (kind() == PropertyKind::dictionary) return static_cast<const DictionaryNode*>(node_of(word_))->live;
+  if (kind() == PropertyKind::dictionary) return dictionary_at(word_).live;
   return 0;
 }
 
@@ -149,8 +149,7 @@ PropertyValue* PropertyValue::slot(std::size_t index) noexcept {
 
 PropertyValue PropertyValue::mutable_copy() const noexcept {
   switch (kind()) {
-    case PropertyKind::dictionary:
-      return adopt(word_of(copy_dictionary(*static_cast<const DictionaryNode*>(node_of(word_)))));
+    case PropertyKind::dictionary: return adopt(word_of(copy_dictionary(dictionary_at(word_))));
     case PropertyKind::array: {
       const auto* from = static_cast<const ArrayNode*>(node_of(word_));
       ArrayNode* copy = new_array(from->used, kMutable);

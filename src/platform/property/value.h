@@ -90,9 +90,9 @@ class [[nodiscard]] PropertyValue {
   /// Stores `value` under `key`, a string; the entry keeps its place when the key is there already. False, and nothing
   /// changed, when this is no mutable dictionary, `key` is no string, `value` is none, or memory runs out.
   [[nodiscard]] bool set(const PropertyValue& key, PropertyValue value) noexcept;
-  /// The same for a key whose text is hashed already; `replaced` receives the value that was there.
-  [[nodiscard]] bool exchange(const HashedKey& key, PropertyValue value, PropertyValue& replaced) noexcept;
   [[nodiscard]] bool set(const HashedKey& key, PropertyValue value) noexcept;
+  /// Adds an entry under a key that is known not to be there; false as for `set`. The key's text must be valid UTF-8.
+  [[nodiscard]] bool add(const HashedKey& key, PropertyValue value) noexcept;
   /// Takes the entry out and returns its value; none when there was none, this is no mutable dictionary, or the copy
   /// that a shared dictionary needs first could not be made.
   PropertyValue remove(const HashedKey& key) noexcept;

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "platform/property/binary.h"
+#include "platform/property/encoded.h"
 
 namespace quorvel::wire {
 
@@ -42,8 +43,14 @@ void write_big_endian(Number number, std::byte* bytes) noexcept {
   return std::all_of(name.begin(), name.end(), [](char c) { return c >= ' ' && c <= '~'; });
 }
 
+// A value that still has the bytes it came from travels as those.
+bool append_value(const PropertyValue& value, ByteBuffer& out) noexcept {
+  const auto bytes = encoded_bytes(value);
+  return bytes.empty() ? write_binary(value, out) : out.append(bytes.data(), bytes.size());
+}
+
 [[nodiscard]] bool append_body(std::string_view name, const PropertyValue& value, ByteBuffer& out) noexcept {
-  return out.append(name) && (!value || write_binary(value, out));
+  return out.append(name) && (!value || append_value(value, out));
 }
 
 }  // namespace

@@ -94,6 +94,11 @@ TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
     EXPECT_EQ(root.mode_of("/run/quorvel/a.sock"), 0666u);
     EXPECT_FALSE(ListeningSocket::open("a.sock"));
     EXPECT_EQ(errno, EADDRINUSE);
+    // A link to a socket is taken inside the device root, as every path is.
+    root.make_link("/run/quorvel/a.sock", "/run/quorvel/inwards.sock");
+    root.make_link(root.path("/run/quorvel/a.sock").string(), "/run/quorvel/outwards.sock");
+    EXPECT_TRUE(platform::host::connect_local("inwards.sock"));
+    EXPECT_FALSE(platform::host::connect_local("outwards.sock"));
   }
   EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));
   EXPECT_FALSE(ListeningSocket::open(std::string(100, 'n')));

@@ -29,8 +29,7 @@ std::string frame_bytes(wire::FrameKind kind, std::uint64_t serial, std::string_
 }
 
 SocketPeer SocketPeer::connected_to(std::string_view name) {
-  const Descriptor directory = platform::host::open_service_directory();
-  return SocketPeer(platform::host::connect_local(directory.get(), name));
+  return SocketPeer(platform::host::connect_local(name));
 }
 
 bool SocketPeer::send(std::string_view bytes) {

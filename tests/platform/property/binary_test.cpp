@@ -4,7 +4,10 @@
 
 #include <cmath>
 #include <limits>
+#include <thread>
+#include <vector>
 
+#include "platform/property/encoded.h"
 #include "platform/property/limits.h"
 #include "support/values.h"
 
@@ -25,8 +28,17 @@ std::string bytes(std::string_view hex) {
   return result;
 }
 
+PropertyValue encoded_value(std::string_view file) {
+  ByteBuffer bytes;
+  EXPECT_TRUE(bytes.append(file));
+  return read_encoded(std::move(bytes));
+}
+
+// Both ways to read must agree on every file.
 PropertyValue decoded(std::string_view file, Mutability mutability = Mutability::immutable) {
-  return read_binary(std::as_bytes(std::span(file)), mutability);
+  PropertyValue value = read_binary(std::as_bytes(std::span(file)), mutability);
+  EXPECT_EQ(encoded_value(file), value);
+  return value;
 }
 
 // A file with one-byte widths around objects, the first of which is the top one.
@@ -207,6 +219,30 @@ TEST(Binary, BoundsHoldForReaderAndWriterAlike) {
   out.clear();
   ASSERT_TRUE(write_binary(wide, out)) << "what stands there is no repetition";
   EXPECT_EQ(read_binary(out.bytes(), Mutability::immutable), wide);
+}
+
+TEST(Binary, ADictionaryThatKeepsItsBytesBehavesLikeAnyOther) {
+  const PropertyValue expected = dictionary({{"a", array({1, "x"})}, {"b", dictionary({})}, {"c", 2.5}});
+  const std::string file = encoded(expected);
+  const PropertyValue value = encoded_value(file);
+  const PropertyValue copy = value;
+  const auto kept = encoded_bytes(copy);
+  EXPECT_EQ(std::string(reinterpret_cast<const char*>(kept.data()), kept.size()), file);
+  EXPECT_TRUE(encoded_bytes(expected).empty());
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&] {
+      EXPECT_EQ(value.get("a").size(), 2u);
+      EXPECT_EQ(value, expected);
+      EXPECT_EQ(encoded(value), file);
+    });
+  }
+  for (auto& thread : threads) thread.join();
+  EXPECT_FALSE(value.is_mutable());
+  PropertyValue open = value.mutable_copy();
+  ASSERT_TRUE(open.set("a", PropertyValue::boolean(true)));
+  EXPECT_EQ(value, expected);
+  EXPECT_TRUE(encoded_bytes(open).empty());
 }
 
 TEST(Binary, MutabilityIsThatOfTheRead) {
