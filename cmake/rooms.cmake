@@ -14,7 +14,7 @@ endif()
 # The daemon's rooms: no exception can leave a function, and nothing asks for a type at run time.
 add_library(quorvel_room_options INTERFACE)
 target_link_libraries(quorvel_room_options INTERFACE quorvel_options)
-target_compile_options(quorvel_room_options INTERFACE -fno-exceptions -fno-rtti)
+target_compile_options(quorvel_room_options INTERFACE -fno-exceptions -fno-rtti -ffunction-sections -fdata-sections)
 
 # quorvel_room(NAME SOURCES file... HEADERS file... LINKS room...): a static library of one room. The headers are each
 # compiled alone by the target all_verify_interface_header_sets.

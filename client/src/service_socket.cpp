@@ -19,7 +19,9 @@
 namespace quorvel::client {
 namespace {
 
-constexpr std::chrono::milliseconds kFullBacklogPause{5};
+constexpr std::chrono::milliseconds kFullBacklogPause{1};
+// No service can listen under a longer name: its socket address would not hold it.
+constexpr std::size_t kLongestName = 80;
 
 ErrorCode code_of(int error) noexcept {
   switch (error) {
@@ -37,45 +39,40 @@ Error failure(ErrorCode code, const std::string& what, int error) {
   return {code, 0, what + ": " + std::strerror(error)};
 }
 
-Descriptor open_in_root(int root, const char* path) noexcept {
+Descriptor open_in_root(const Descriptor& root, const std::string& path) noexcept {
   open_how how{};
-  how.flags = O_PATH | O_DIRECTORY | O_CLOEXEC;
+  how.flags = O_PATH | O_CLOEXEC;
   how.resolve = RESOLVE_IN_ROOT;
   long descriptor;
   do {
-    descriptor = ::syscall(SYS_openat2, root, path, &how, sizeof how);
+    descriptor = ::syscall(SYS_openat2, root.get(), path.c_str(), &how, sizeof how);
   } while (descriptor < 0 && (errno == EINTR || errno == EAGAIN));
   return Descriptor(static_cast<int>(descriptor));
 }
 
-Descriptor open_service_directory(const std::string& given_root, std::optional<Error>& error) {
+Descriptor open_root(const std::string& given_root, std::optional<Error>& error) {
   std::string root = given_root;
   if (root.empty()) {
     const char* environment = std::getenv("QUORVEL_ROOT");
     root = environment != nullptr ? environment : "/";
   }
-  const Descriptor top(root.starts_with('/') ? ::open(root.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC) : -1);
-  if (!top) {
+  Descriptor directory(root.starts_with('/') ? ::open(root.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC) : -1);
+  if (!directory) {
     const int reason = root.starts_with('/') ? errno : EINVAL;
     error = failure(ErrorCode::invalid_root, "The device root \"" + root + "\" cannot be used", reason);
-    return {};
-  }
-  Descriptor directory = open_in_root(top.get(), wire::kServiceDirectory.data());
-  if (!directory) {
-    const int reason = errno;
-    error = failure(code_of(reason), "No service runs in the device root \"" + root + "\"", reason);
   }
   return directory;
 }
 
-// The address goes through the directory's descriptor, so that no root path is too long for it.
-sockaddr_un address_in(const Descriptor& directory, const std::string& socket) noexcept {
+// Connects to the socket at `path`, or returns why not. The address goes through the descriptor of the socket itself:
+// no root path is too long for that, and a link in the socket's place is taken inside the root.
+int connect_in_root(const Descriptor& connection, const Descriptor& root, const std::string& path) noexcept {
+  const Descriptor file = open_in_root(root, path);
+  if (!file) return errno;
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  const int length =
-      std::snprintf(address.sun_path, sizeof address.sun_path, "/proc/self/fd/%d/%s", directory.get(), socket.c_str());
-  if (length < 0 || static_cast<std::size_t>(length) >= sizeof address.sun_path) address.sun_path[0] = '\0';
-  return address;
+  std::snprintf(address.sun_path, sizeof address.sun_path, "/proc/self/fd/%d", file.get());
+  return ::connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0 ? 0 : errno;
 }
 
 }  // namespace
@@ -103,10 +100,9 @@ bool wait_until_ready(int descriptor, short events, Deadline deadline) noexcept 
 
 Descriptor connect_to_service(const std::string& root, const std::string& socket, Deadline deadline,
                               std::optional<Error>& error) {
-  const Descriptor directory = open_service_directory(root, error);
+  const Descriptor directory = open_root(root, error);
   if (!directory) return {};
-  const sockaddr_un address = address_in(directory, socket);
-  if (address.sun_path[0] == '\0' || socket.find('/') != std::string::npos) {
+  if (socket.size() > kLongestName || socket.find('/') != std::string::npos) {
     error = Error{ErrorCode::invalid_argument, 0, "\"" + socket + "\" cannot be the name of a service's socket."};
     return {};
   }
@@ -115,8 +111,8 @@ Descriptor connect_to_service(const std::string& root, const std::string& socket
     error = failure(ErrorCode::system_failure, "No socket can be had", errno);
     return {};
   }
-  while (::connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-    const int reason = errno;
+  const std::string path = std::string(wire::kServiceDirectory) + '/' + socket;
+  while (const int reason = connect_in_root(connection, directory, path)) {
     // A service with a full backlog is there, only busy; a socket of this kind cannot be waited for.
     if (reason != EAGAIN && reason != EINTR) {
       error = failure(code_of(reason), "Cannot connect to \"" + socket + "\"", reason);

@@ -104,10 +104,8 @@ bool has_type(const Descriptor& file, const char* path, mode_t expected_type) no
 // What the caller's flags asked of the open and what had to wait for the checks. A failure is a failed open.
 bool finish_open(const Descriptor& file, const char* path, int flags, mode_t type) noexcept {
   int result = 0;
-  if ((flags & O_NONBLOCK) == 0) {
-    const int status_flags = ::fcntl(file.get(), F_GETFL);
-    result = status_flags < 0 ? -1 : ::fcntl(file.get(), F_SETFL, status_flags & ~O_NONBLOCK);
-  }
+  // Of the flags given here only those count that can change after an open.
+  if ((flags & O_NONBLOCK) == 0) result = ::fcntl(file.get(), F_SETFL, flags);
   if (result == 0 && (flags & O_TRUNC) != 0 && type == kRegularFile) {
     do {
       result = ::ftruncate(file.get(), 0);

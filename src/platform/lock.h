@@ -7,7 +7,7 @@
 //   log lock            innermost: nothing is taken while it is held
 #pragma once
 
-#include <atomic>
+#include <mutex>
 
 #if defined(__clang__)
 #define QUORVEL_THREAD_ANNOTATION(x) __attribute__((x))
@@ -21,42 +21,17 @@
 
 namespace quorvel {
 
-/// A non-recursive mutual-exclusion lock, ready without a set-up call. What it guards is held for moments, so a thread
-/// that finds it taken looks again a few times before it sleeps.
+/// A non-recursive mutual-exclusion lock, ready without a set-up call.
 class QUORVEL_THREAD_ANNOTATION(capability("mutex")) Lock {
  public:
   constexpr Lock() noexcept = default;
   Lock(const Lock&) = delete;
   Lock& operator=(const Lock&) = delete;
-  void acquire() noexcept QUORVEL_THREAD_ANNOTATION(acquire_capability()) {
-    int expected = kFree;
-    if (!state_.compare_exchange_strong(expected, kTaken, std::memory_order_acquire)) wait();
-  }
-  void release() noexcept QUORVEL_THREAD_ANNOTATION(release_capability()) {
-    if (state_.exchange(kFree, std::memory_order_release) == kAwaited) state_.notify_one();
-  }
+  void acquire() noexcept QUORVEL_THREAD_ANNOTATION(acquire_capability()) { mutex_.lock(); }
+  void release() noexcept QUORVEL_THREAD_ANNOTATION(release_capability()) { mutex_.unlock(); }
 
  private:
-  static constexpr int kFree = 0, kTaken = 1, kAwaited = 2;
-  static constexpr int kLooks = 200;
-
-  void wait() noexcept {
-    for (int i = 0; i < kLooks; ++i) {
-      if (state_.load(std::memory_order_relaxed) == kFree) {
-        int expected = kFree;
-        if (state_.compare_exchange_strong(expected, kTaken, std::memory_order_acquire)) return;
-      }
-#if defined(__x86_64__) || defined(__i386__)
-      __builtin_ia32_pause();
-#endif
-    }
-    // Taken as awaited: whether others sleep as well is not known.
-    while (state_.exchange(kAwaited, std::memory_order_acquire) != kFree) {
-      state_.wait(kAwaited, std::memory_order_relaxed);
-    }
-  }
-
-  std::atomic<int> state_ = kFree;
+  std::mutex mutex_;
 };
 
 /// Holds a lock for a scope.

@@ -7,14 +7,14 @@ namespace quorvel {
 
 namespace {
 
-// Adds an entry that is not there; it joins the classes of its domain. False, and nothing changed, when memory runs
-// out.
-bool insert(DataArk& ark, const StoreKey& key, PropertyValue value) noexcept QUORVEL_REQUIRES(ark.lock) {
+// Adds an entry that is not there; it joins the classes of its domain, which are added to `classes`, those it is in
+// already. False, and nothing changed, when memory runs out.
+bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, unsigned& classes) noexcept
+    QUORVEL_REQUIRES(ark.lock) {
   unsigned joined = 0;
-  if (key.has_key() && ark.class_marks.size() > 0) {
-    joined = ark.classes_of(key.domain_text()) & ~ark.classes_of(key.hashed());
-    if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
-  }
+  if (key.has_key() && ark.class_marks.size() > 0) joined = ark.classes_of(key.domain_text()) & ~classes;
+  if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
+  classes |= joined;
   if (ark.values.add(key.hashed(), std::move(value))) return true;
   if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
@@ -43,17 +43,20 @@ int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue&
   if (!store_key) return -1;
   PropertyValue stored(value);  // becomes the old value, which ends after the lock is given back
   const LockHold hold(ark->lock);
-  if (!ark->values) ark->values = PropertyValue::dictionary();
+  const bool is_first = !ark->values;
+  if (is_first) ark->values = PropertyValue::dictionary();
   if (!ark->values) return -1;
-  bool changed = true;
-  if (PropertyValue* slot = ark->values.slot(store_key.hashed())) {
-    changed = !(*slot == value);
+  PropertyValue* const slot = ark->values.slot(store_key.hashed());
+  const bool changed = slot == nullptr || !(*slot == value);
+  unsigned classes = changed ? ark->classes_of(store_key.hashed()) : 0;
+  if (slot != nullptr) {
     std::swap(*slot, stored);
-  } else if (!insert(*ark, store_key, std::move(stored))) {
+  } else if (!insert(*ark, store_key, std::move(stored), classes)) {
+    if (is_first) ark->values = nullptr;
     return -1;
   }
   post_set_events(*ark, store_key, changed);
-  if (changed && (ark->classes_of(store_key.hashed()) & kUncountedSet) == 0) {
+  if (changed && (classes & kUncountedSet) == 0) {
     daemon_log(0, "data_ark_set", "dirtied by changing %s", store_key.text());
     ++ark->change_count;
   }

@@ -1,6 +1,6 @@
 #include "store/data_ark_file.h"
 
-#include <string.h>
+#include <fcntl.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -10,6 +10,7 @@
 #include "files/property_list_file.h"
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
+#include "platform/descriptor.h"
 #include "store/data_ark.h"
 #include "store/data_ark_record.h"
 
@@ -22,10 +23,11 @@ void compose(char (&path)[platform::kPathSize], const char* head, const char* ta
   static_cast<void>(std::snprintf(path, sizeof path, "%.500s%s", head, tail));
 }
 
-// Only an error that says so means that no file is there.
-bool file_is_there(const char* path) noexcept {
-  struct stat status {};
-  return platform::file_status(path, &status) == 0 || (errno != ENOENT && errno != ENOTDIR);
+// Anything that stands there counts, a link that leads nowhere just now included: only an error that says so means that
+// nothing does.
+bool something_is_there(const char* path) noexcept {
+  const Descriptor object(platform::open_file(path, O_PATH | O_NOFOLLOW, 0));
+  return object || (errno != ENOENT && errno != ENOTDIR);
 }
 
 // The entries that a save writes; none when memory runs out. They are the values themselves where no key is left out,
@@ -41,9 +43,18 @@ PropertyValue copy_saved_entries(const DataArk& ark) noexcept QUORVEL_REQUIRES(a
   return saved;
 }
 
-// Moves a file that could not be loaded out of the way of the one that replaces it.
+// Moves what could not be loaded out of the way of the file that replaces it.
 bool set_aside(DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRES(ark.lock) {
-  if (platform::rename_file(paths.file, paths.set_aside) != 0 && errno != ENOENT) {
+  if (!something_is_there(paths.file)) {
+    ark.file_is_unreadable = false;
+    return true;
+  }
+  int result = platform::rename_file(paths.file, paths.set_aside);
+  // A directory does not replace an older file by itself.
+  if (result != 0 && errno == ENOTDIR && platform::remove_file(paths.set_aside) == 0) {
+    result = platform::rename_file(paths.file, paths.set_aside);
+  }
+  if (result != 0) {
     daemon_log(0, "data_ark_store", "Could not set %s aside as %s: %s", paths.file, paths.set_aside,
                ErrorText().text());
     return false;
@@ -99,7 +110,7 @@ DataArk* data_ark_load() noexcept {
   if (loaded.is_dictionary()) {
     ark->values = std::move(loaded);
   } else {
-    ark->file_is_unreadable = loaded || file_is_there(paths.file);
+    ark->file_is_unreadable = loaded || something_is_there(paths.file);
     daemon_log(0, "data_ark_load", "Could not load %s", paths.file);
   }
   return ark;

@@ -1,65 +1,32 @@
 // The client library against services that misbehave, and the errors it reports.
 #include "quorvel/client.h"
 
-#include <fcntl.h>
-#include <gtest/gtest.h>
-#include <sys/socket.h>
-#include <sys/stat.h>
-#include <sys/un.h>
-
-#include <cstdio>
-#include <functional>
 #include <future>
-#include <thread>
 
-#include "platform/descriptor.h"
-#include "platform/wire/frame.h"
 #include "protocol/quorvel_protocol.h"
 #include "quorvel/observer.h"
-#include "support/descriptors.h"
 #include "support/scratch_root.h"
-#include "support/values.h"
+#include "support/socket_peer.h"
 
 namespace quorvel::client {
 namespace {
 
-using namespace std::chrono_literals;
 using namespace quorvel::test;
 
+constexpr const char* kService = "com.Orvane.quorveld.sock";
 const std::string kSocket = "/run/quorvel/com.Orvane.quorveld.sock";
-const std::string kObserved = "/run/quorvel/notifications.sock";
-
-std::string frame(wire::FrameKind kind, std::uint64_t serial, std::string_view name, const PropertyValue& value) {
-  ByteBuffer bytes;
-  EXPECT_TRUE(wire::append_frame(kind, 0, serial, name, value, bytes));
-  return {reinterpret_cast<const char*>(bytes.data()), bytes.size()};
-}
 
 // A service that takes one connection, sends what it is told to in pieces, and keeps the connection open if asked.
 class Service {
  public:
-  Service(const ScratchRoot& root, const std::string& path, std::vector<std::string> pieces, bool hold)
-      : listener_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
-    const std::string file = root.path(path);
-    const std::filesystem::path directory = std::filesystem::path(file).parent_path();
-    const Descriptor run(::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    sockaddr_un address{};
-    address.sun_family = AF_UNIX;
-    std::snprintf(address.sun_path, sizeof address.sun_path, "/proc/self/fd/%d/%s", run.get(),
-                  std::filesystem::path(file).filename().c_str());
-    if (::bind(listener_.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
-        ::listen(listener_.get(), 1) != 0) {
-      throw std::runtime_error("the service cannot listen");
-    }
+  Service(std::string_view name, std::vector<std::string> pieces, bool hold) : listener_(listen_on(name)) {
     thread_ = std::thread([this, sent = std::move(pieces), hold] {
-      const Descriptor connection(::accept(listener_.get(), nullptr, nullptr));
+      SocketPeer connection = accept_from(listener_);
       for (const std::string& piece : sent) {
-        ::send(connection.get(), piece.data(), piece.size(), MSG_NOSIGNAL);
+        connection.send(piece);
         std::this_thread::sleep_for(2ms);
       }
-      char byte;
-      while (hold && ::recv(connection.get(), &byte, 1, 0) > 0) {
-      }
+      while (hold && connection.receive()) continue;
     });
   }
   ~Service() { thread_.join(); }
@@ -77,8 +44,11 @@ class ClientTest : public testing::Test {
 
 TEST_F(ClientTest, TellsHowAServiceMisbehaves) {
   using Kind = wire::FrameKind;
-  const std::string reply = frame(Kind::reply, 1, "", text("answer"));
-  const std::string state = frame(Kind::state, 0, "", dictionary({}));
+  const std::string reply = frame_bytes(Kind::reply, 1, "", text("answer"));
+  const std::string state = frame_bytes(Kind::state, 0, "", dictionary({}));
+  const std::string too_much("\x7f\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1", 16);
+  const std::string no_list("\0\0\0\4\2\0\0\0\0\0\0\0\0\0\0\1nope", 20);
+  const std::string busy = frame_bytes(Kind::failure, 1, "", dictionary({{"Code", 7}, {"Description", "busy"}}));
   std::vector<std::string> trickle;
   for (const char byte : state + reply) trickle.emplace_back(1, byte);
   struct Case {
@@ -93,26 +63,19 @@ TEST_F(ClientTest, TellsHowAServiceMisbehaves) {
       {"closes within the reply", {reply.substr(0, reply.size() - 1)}, false, ErrorCode::disconnected},
       {"says nothing", {}, true, ErrorCode::timed_out},
       {"stops within the reply", {reply.substr(0, 20)}, true, ErrorCode::timed_out},
-      {"answers another call", {frame(Kind::reply, 2, "", text("x"))}, true, ErrorCode::timed_out},
-      {"announces more than the limit",
-       {std::string("\x7f\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1", 16)},
-       true,
-       ErrorCode::protocol_error},
+      {"answers another call", {frame_bytes(Kind::reply, 2, "", text("x"))}, true, ErrorCode::timed_out},
+      {"announces more than the limit", {too_much}, true, ErrorCode::protocol_error},
       {"sends garbage", {std::string(64, '\xff')}, true, ErrorCode::protocol_error},
-      {"replies with no property list",
-       {std::string("\0\0\0\4\2\0\0\0\0\0\0\0\0\0\0\1nope", 20)},
-       true,
-       ErrorCode::protocol_error},
-      {"fails",
-       {frame(Kind::failure, 1, "", dictionary({{"Code", 7}, {"Description", "busy"}}))},
-       true,
-       ErrorCode::service_failure},
-      {"fails oddly", {frame(Kind::failure, 1, "", array({1}))}, true, ErrorCode::service_failure},
+      {"replies with no property list", {no_list}, true, ErrorCode::protocol_error},
+      {"fails", {busy}, true, ErrorCode::service_failure},
+      {"fails oddly", {frame_bytes(Kind::failure, 1, "", array({1}))}, true, ErrorCode::service_failure},
   };
+  static_cast<void>(listen_on(kService));  // the root itself stays open from here on
+  root.remove(kSocket);
   const std::size_t before = descriptors_open();
   for (const Case& test : cases) {
     {
-      Service service(root, kSocket, test.pieces, test.hold);
+      Service service(kService, test.pieces, test.hold);
       Options options;
       options.timeout = test.error == ErrorCode::timed_out ? 100ms : 20s;
       const Reply answer = Client(options).copy_regulatory_images();
@@ -146,7 +109,9 @@ TEST_F(ClientTest, TellsWhyThereIsNoService) {
 }
 
 TEST_F(ClientTest, CompletesOnceOnAThreadOfItsOwn) {
-  Service service(root, kSocket, {frame(wire::FrameKind::reply, 1, "", text("answer"))}, false);
+  // A link in the socket's place is taken inside the device root, as every path is.
+  root.make_link("/run/quorvel/elsewhere.sock", kSocket);
+  Service service("elsewhere.sock", {frame_bytes(wire::FrameKind::reply, 1, "", text("answer"))}, false);
   std::promise<std::pair<std::thread::id, std::string>> completed;
   {
     const PendingCall call = Client().copy_regulatory_images([&completed](const Reply& reply) {
@@ -160,10 +125,11 @@ TEST_F(ClientTest, CompletesOnceOnAThreadOfItsOwn) {
 
 TEST_F(ClientTest, ObservesNotificationsAndWhatItMissed) {
   using Kind = wire::FrameKind;
-  Service service(root, kObserved,
-                  {frame(Kind::ready, 41, "", {}), frame(Kind::notification, 42, "changed", text("changed")),
-                   frame(Kind::missed, 50, "", PropertyValue::integer(8)), frame(Kind::reply, 1, "", {})},
-                  true);
+  Service service(
+      "notifications.sock",
+      {frame_bytes(Kind::ready, 41, "", {}), frame_bytes(Kind::notification, 42, "changed", text("changed")),
+       frame_bytes(Kind::missed, 50, "", PropertyValue::integer(8)), frame_bytes(Kind::reply, 1, "", {})},
+      true);
   Observer observer;
   ASSERT_FALSE(observer.connect());
   EXPECT_EQ(observer.first_sequence(), 41u);

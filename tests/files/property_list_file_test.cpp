@@ -1,16 +1,10 @@
 #include "files/property_list_file.h"
 
-#include <gtest/gtest.h>
 #include <sys/resource.h>
-#include <unistd.h>
 
-#include <csignal>
-#include <filesystem>
-#include <string>
-
-#include "support/descriptors.h"
+#include "files/value_helpers.h"
+#include "platform/file_system.h"
 #include "support/scratch_root.h"
-#include "support/values.h"
 
 namespace quorvel::test {
 namespace {
@@ -46,6 +40,8 @@ TEST_F(PropertyListFile, WhatIsStoredIsLoadedEqual) {
       EXPECT_EQ(root.read_file(kFile).substr(0, 8), "bplist00");
       EXPECT_EQ(load_dict(kFile.c_str()), value);
       EXPECT_EQ(load_mutable_dict(kFile.c_str()), value);
+      EXPECT_FALSE(load_dict(kFile.c_str()).is_mutable());
+      EXPECT_EQ(load_mutable_dict(kFile.c_str()).is_mutable(), value.is_container());
     }
   }
   EXPECT_EQ(root.mode_of(kFile), 0644u);
@@ -53,21 +49,6 @@ TEST_F(PropertyListFile, WhatIsStoredIsLoadedEqual) {
   EXPECT_EQ(store_dict(kFile.c_str(), array({})), 0);
   EXPECT_EQ(root.mode_of(kFile), 0600u);
   EXPECT_EQ(root.read_plist(kFile), array({}));
-}
-
-TEST_F(PropertyListFile, OnlyAMutableLoadAcceptsChanges) {
-  root.write_plist(kFile, sample());
-  PropertyValue fixed = load_dict(kFile.c_str());
-  EXPECT_FALSE(fixed.set("key", text("value")));
-  EXPECT_EQ(fixed.slot("nested"), nullptr);
-  EXPECT_FALSE(fixed.get("nested").is_mutable() || fixed.get("array").is_mutable());
-
-  PropertyValue open = load_mutable_dict(kFile.c_str());
-  EXPECT_TRUE(open.set("key", text("value")));
-  ASSERT_NE(open.slot("nested"), nullptr);
-  EXPECT_TRUE(open.slot("nested")->set("key", text("value")));
-  ASSERT_NE(open.slot("array"), nullptr);
-  EXPECT_TRUE(open.slot("array")->append(text("value")));
 }
 
 TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
@@ -125,6 +106,35 @@ TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
         {"store_dict: Could not write to " + kFile + ": Success", info(kFile, "100644"), info(kFolder, "40755")});
   }
   EXPECT_EQ(root.read_file(kFile).size(), 65536u);
+}
+
+TEST(MakeMutable, EndsTheProcessForEveryOtherKind) {
+  ScratchRoot root;
+  for (const PropertyValue& value : {text("a"), PropertyValue::integer(1), array({}), PropertyValue()}) {
+    EXPECT_EXIT(static_cast<void>(make_mutable(value)), testing::ExitedWithCode(255), "We are dead!");
+    root.expect_log({"make_mutable: Could not create mutable copy! We are dead!"});
+  }
+}
+
+TEST(DictForEach, MeetsEachEntryOnceWhateverTheCallbackDoes) {
+  struct Meeting {
+    PropertyValue dictionary = test::dictionary({{"a", 1}, {"b", "two"}, {"c", 3}});
+    std::vector<std::string> met;
+  } meeting;
+  const auto meet = [](const PropertyValue& key, const PropertyValue& value, void* context) noexcept {
+    auto& state = *static_cast<Meeting*>(context);
+    state.met.push_back(std::string(key.text()) + "=" + described(value));
+    static_cast<void>(state.dictionary.remove("b"));
+    static_cast<void>(state.dictionary.remove("c"));
+    EXPECT_TRUE(state.dictionary.set("new " + std::string(key.text()), PropertyValue::integer(0)));
+  };
+  dict_for_each(meeting.dictionary, meet, &meeting);
+  EXPECT_EQ(meeting.met, (std::vector<std::string>{"a=1", "b=two", "c=3"}));
+  EXPECT_EQ(described(meeting.dictionary.get("b")), "(null)");
+  EXPECT_EQ(meeting.dictionary.size(), 4u);
+  meeting.met.clear();
+  dict_for_each(dictionary({}), meet, &meeting);
+  EXPECT_TRUE(meeting.met.empty());
 }
 
 }  // namespace

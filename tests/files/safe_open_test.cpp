@@ -1,16 +1,6 @@
 #include "files/safe_open.h"
 
-#include <fcntl.h>
-#include <gtest/gtest.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstring>
-#include <string>
-#include <vector>
-
 #include "platform/descriptor.h"
-#include "support/descriptors.h"
 #include "support/scratch_root.h"
 
 namespace quorvel::test {
@@ -122,9 +112,7 @@ TEST_F(SafeOpen, OpensCreatesAndTruncatesTheObjectNamed) {
     EXPECT_EQ(::fcntl(file.get(), F_GETFL) & O_NONBLOCK, 0);
     EXPECT_EQ(::fcntl(file.get(), F_GETFD), FD_CLOEXEC);
     EXPECT_EQ(root.mode_of(c.path), c.mode);
-    if ((c.flags & O_TRUNC) != 0) {
-      EXPECT_EQ(root.read_file(c.path), "");
-    }
+    EXPECT_TRUE((c.flags & O_TRUNC) == 0 || root.read_file(c.path).empty());
   }
   const Descriptor fifo(_safe_open((kHome + "/fifo").c_str(), O_RDWR | O_NONBLOCK, 0, 0x1000));
   EXPECT_EQ(::fcntl(fifo.get(), F_GETFL) & O_NONBLOCK, O_NONBLOCK);
@@ -172,6 +160,65 @@ TEST(DirnameInPlace, StripsTheLastComponent) {
     EXPECT_STREQ(buffer.c_str(), directory.c_str()) << path;
   }
   EXPECT_EQ(dirname_in_place(nullptr), nullptr);
+}
+
+// Does something over and over on a thread of its own until it ends.
+class Meddler {
+ public:
+  explicit Meddler(std::function<void()> act)
+      : thread_([this, act = std::move(act)] {
+          for (; !stop_; ++rounds_) act();
+        }) {}
+  ~Meddler() {
+    stop_ = true;
+    thread_.join();
+  }
+  [[nodiscard]] long rounds() const { return rounds_; }
+
+ private:
+  std::atomic<bool> stop_ = false;
+  std::atomic<long> rounds_ = 0;
+  std::thread thread_;
+};
+
+TEST(SafeOpenRace, NothingOutsideTheCanonicalPathIsOpenedOrMade) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.write_file("/state/file", "");
+  root.write_file("/decoy/file", "precious");
+  root.make_link("/decoy", "/spare");
+  const Descriptor state(::open(root.path("/state").c_str(), O_PATH | O_DIRECTORY));
+  struct stat real {};
+  ASSERT_EQ(::fstatat(state.get(), "file", &real, 0), 0);
+  const std::string first = root.path("/state");
+  const std::string second = root.path("/spare");
+  const Meddler meddler([&] { ::renameat2(AT_FDCWD, first.c_str(), AT_FDCWD, second.c_str(), RENAME_EXCHANGE); });
+  int accepted = 0;
+  int refused = 0;
+  int made = 0;
+  for (int i = 0; i < 20'000; ++i) {
+    const Descriptor file(_safe_open("/state/file", O_WRONLY | O_CREAT | O_TRUNC, 0644, kRegularFile));
+    struct stat opened = real;
+    if (file) ::fstat(file.get(), &opened);
+    EXPECT_EQ(opened.st_ino, real.st_ino);
+    ++(file ? accepted : refused);
+    made += static_cast<bool>(Descriptor(_safe_open("/state/new", O_WRONLY | O_CREAT, 0644, kRegularFile)));
+    ::unlinkat(state.get(), "new", 0);
+  }
+  for (const long count : {long{accepted}, long{refused}, long{made}, meddler.rounds()}) EXPECT_GT(count, 100);
+  EXPECT_EQ(root.read_file("/decoy/file"), "precious");
+  EXPECT_FALSE(root.exists("/decoy/new"));
+}
+
+TEST(SafeOpenRace, AFileReplacedByARenameIsNeverRefused) {
+  ScratchRoot root;
+  root.write_file("/file", "");
+  const Meddler provisioner([&] {
+    root.write_file("/fresh", "");
+    std::filesystem::rename(root.path("/fresh"), root.path("/file"));
+  });
+  for (int i = 0; i < 20'000; ++i) ASSERT_TRUE(Descriptor(_safe_open("/file", O_RDONLY, 0, kRegularFile)));
+  EXPECT_GT(provisioner.rounds(), 100);
 }
 
 }  // namespace

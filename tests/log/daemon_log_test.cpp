@@ -1,16 +1,14 @@
 #include "log/daemon_log.h"
 
-#include <gtest/gtest.h>
-
 #include <ctime>
 #include <regex>
 
+#include "log/extended_logging.h"
+#include "log/log_writer.h"
 #include "log/message.h"
 #include "support/scratch_root.h"
-#include "support/values.h"
 
 namespace quorvel::test {
-namespace {
 
 TEST(DaemonLog, WritesTheLineFormat) {
   ScratchRoot root;
@@ -74,5 +72,110 @@ TEST(DaemonLog, ALineIsCutAt2047Bytes) {
   EXPECT_TRUE(line.ends_with("😀"));
 }
 
-}  // namespace
+TEST(ExtendedLogging, IsSettledByReleaseTypeThenPreference) {
+  const struct {
+    const char* name;
+    PropertyValue release_type;
+    PropertyValue preference;
+    int expected;
+  } cases[] = {
+      {"neither", nullptr, nullptr, 0},
+      {"internal", text("Internal"), nullptr, 1},
+      {"internal in another case", text("internal"), nullptr, 0},
+      {"no text", data("Internal"), nullptr, 0},
+      {"preference", text("Release"), PropertyValue::integer(1), 1},
+      {"a preference of 0 counts as well", nullptr, PropertyValue::integer(0), 1},
+      {"a text is no integer", nullptr, text("1"), 0},
+      {"a boolean is no integer", nullptr, PropertyValue::boolean(true), 0},
+      {"a real is no integer", nullptr, PropertyValue::real(1), 0},
+  };
+  EXPECT_EQ(extended_logging, 1) << "until it is settled";
+  ScratchRoot root;
+  for (const auto& [name, release_type, preference, expected] : cases) {
+    PropertyValue answers = dictionary({}), preferences = dictionary({{"Other", 1}});
+    ASSERT_TRUE(!release_type || answers.set("ReleaseType", release_type));
+    ASSERT_TRUE(!preference || preferences.set("ExtLogging", preference));
+    root.write_plist("/etc/quorvel/device_information.plist", answers);
+    root.write_plist("/private/var/mobile/Library/Preferences/com.Orvane.quorveld.plist", preferences);
+    setup_extended_logging();
+    EXPECT_EQ(extended_logging, expected) << name;
+  }
+}
+
+const std::string kPrevious = std::string(kLogFile) + ".1";
+
+TEST(LogWriter, RotatesAfterTheLineThatFillsTheFile) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.write_file("/private/var/mobile/Library/Logs/quorveld.log", std::string(1'048'575 - 2, 'x') + "\n");
+  root.write_file("/private/var/mobile/Library/Logs/quorveld.log.1", "older");
+  log_write_line("a");
+  EXPECT_EQ(root.read_file(kLogFile).size(), 1'048'575u);
+  EXPECT_EQ(root.read_file(kPrevious), "older");
+  log_write_line("b");
+  EXPECT_FALSE(root.exists(kLogFile));
+  EXPECT_EQ(root.read_file(kPrevious).size(), 1'048'576u);
+  log_write_line("new\n");
+  EXPECT_EQ(root.read_file(kLogFile), "new\n");
+  EXPECT_EQ(root.mode_of("/private/var/mobile/Library/Logs/quorveld.log"), 0644u);
+  EXPECT_EQ(log_rotate_if_needed("/nowhere", -1), 0);
+  EXPECT_EQ(log_rotate_if_needed("/nowhere", 1'048'575), 0);
+  EXPECT_EQ(log_rotate_if_needed("/nowhere", std::int64_t{1} << 40), 1);
+}
+
+TEST(LogWriter, WritesAgainOnceTheFileIsMended) {
+  const std::string path = "/private/var/mobile/Library/Logs/quorveld.log";
+  const struct {
+    const char* name;
+    void (*put)(ScratchRoot&, const std::string&);
+  } obstacles[] = {
+      {"directory", [](ScratchRoot& root, const std::string& at) { root.make_directory(at); }},
+      {"FIFO", [](ScratchRoot& root, const std::string& at) { root.make_fifo(at); }},
+      {"link", [](ScratchRoot& root, const std::string& at) { root.make_link("decoy", at); }},
+      {"dangling link", [](ScratchRoot& root, const std::string& at) { root.make_link("nowhere", at); }},
+  };
+  ScratchRoot root;
+  root.ignore_log();
+  root.write_file("/private/var/mobile/Library/Logs/decoy", "untouched");
+  // A rotation closes the file, so that each obstacle is met by an open.
+  const auto rotate = [&] { log_write_line(std::string(1'048'576, '.').c_str()); };
+  for (const auto& obstacle : obstacles) {
+    rotate();
+    obstacle.put(root, path);
+    const std::size_t open = descriptors_open();
+    for (int i = 0; i < 3; ++i) log_write_line("lost\n");
+    EXPECT_EQ(descriptors_open(), open) << obstacle.name;
+    root.remove(path);
+    log_write_line("kept\n");
+    EXPECT_EQ(root.read_file(path), "kept\n") << obstacle.name;
+  }
+  EXPECT_EQ(root.read_file("/private/var/mobile/Library/Logs/decoy"), "untouched");
+  EXPECT_FALSE(root.exists("/private/var/mobile/Library/Logs/nowhere"));
+}
+
+TEST(LogWriter, ThreadsThroughRotationsKeepEveryLineWholeAndInOrder) {
+  constexpr int kThreads = 8, kLines = 5'000;
+  ScratchRoot root;
+  root.ignore_log();
+  std::vector<std::thread> threads;
+  for (int t = 0; t < kThreads; ++t) {
+    threads.emplace_back([t] {
+      for (int i = 0; i < kLines; ++i) daemon_log(0, "f", "thread %d line %d %s", t, i, std::string(180, '=').c_str());
+    });
+  }
+  for (auto& thread : threads) thread.join();
+  // Older generations are gone by now: what is left must be the unbroken end of each thread's lines.
+  std::map<int, int> last;
+  std::istringstream lines(root.read_file(kPrevious) + root.read_file(kLogFile));
+  for (std::string line; std::getline(lines, line);) {
+    int thread = -1, number = -1;
+    ASSERT_EQ(std::sscanf(line.c_str() + line.find(" f: "), " f: thread %d line %d =", &thread, &number), 2) << line;
+    ASSERT_TRUE(line.ends_with(std::string(180, '=')));
+    ASSERT_TRUE(!last.contains(thread) || number == last[thread] + 1) << thread;
+    last[thread] = number;
+  }
+  for (int t = 0; t < kThreads; ++t) EXPECT_TRUE(!last.contains(t) || last[t] == kLines - 1) << t;
+  EXPECT_GT(last.size(), 0u);
+}
+
 }  // namespace quorvel::test

@@ -1,18 +1,20 @@
 #include "store/data_ark.h"
 
-#include <gtest/gtest.h>
-
-#include <atomic>
-#include <thread>
-
-#include "kept_ark.h"
 #include "log/daemon_log.h"
+#include "platform/process.h"
+#include "quorvel/observer.h"
 #include "store/data_ark_record.h"
+#include "store/live_answers.h"
+#include "store/standard_key_classes.h"
 #include "support/scratch_root.h"
-#include "support/values.h"
 
 namespace quorvel::test {
-namespace {
+
+// Loads a data ark that the process keeps to its end, as the daemon does.
+DataArk* load_kept_ark() {
+  static auto& arks = *new std::vector<DataArk*>;
+  return arks.emplace_back(data_ark_load());
+}
 
 // A data ark in a root without a data file, with the lines of its load read.
 class DataArkTest : public testing::Test {
@@ -65,9 +67,7 @@ TEST_F(DataArkTest, OnlyChangesOutsideTheExemptClassesCount) {
     std::uint32_t expected = change_count();
     EXPECT_EQ(set(domain, key, "value"), 0);
     EXPECT_EQ(change_count(), expected += set_counts);
-    if (set_counts) {
-      root_.expect_log({"data_ark_set: dirtied by changing " + name});
-    }
+    if (set_counts) root_.expect_log({"data_ark_set: dirtied by changing " + name});
     EXPECT_EQ(set(domain, key, "value"), 0) << "an equal value changes nothing";
     EXPECT_EQ(change_count(), expected);
     extended_logging = 1;
@@ -129,33 +129,175 @@ TEST_F(DataArkTest, EdgesAnswerAsDocumented) {
   root_.expect_log({"data_ark_set: dirtied by changing -list", "data_ark_set: dirtied by changing -nan"});
 }
 
-TEST_F(DataArkTest, ThreadsSeeWholeValues) {
-  root_.ignore_log();
-  data_ark_add_to_class(ark_, text("d"), nullptr, 1);
-  std::atomic<bool> stop = false;
-  std::vector<std::thread> threads;
-  for (int t = 0; t < 4; ++t) {
-    threads.emplace_back([&, t] {
-      for (int i = 0; !stop; ++i) {
-        const PropertyValue key = text("key" + std::to_string((i + t) % 50));
-        if (i % 7 == 0) {
-          data_ark_remove_extended(ark_, text("d"), key, 0);
-        } else if (i % 11 == 0) {
-          data_ark_store(ark_);
-        } else {
-          set(text("d"), key, array({i, i}));
-        }
-        const PropertyValue pair = data_ark_copy(ark_, text("d"), key);
-        ASSERT_EQ(pair.at(0), pair.at(1));
-        const PropertyValue view = data_ark_copy(ark_, text("d"), nullptr);
-        for (const auto& [name, value] : view.entries()) ASSERT_EQ(value.at(0), value.at(1));
-      }
-    });
-  }
-  std::this_thread::sleep_for(std::chrono::milliseconds(300));
-  stop = true;
-  for (auto& thread : threads) thread.join();
+TEST(RegisteredNotifications, ArePostedForTheirEventsOnly) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.make_directory(kStateDirectory);
+  ASSERT_EQ(platform::start_process(), 0);
+  DataArk* ark = data_ark_load();
+  client::Observer observer;
+  ASSERT_FALSE(observer.connect());
+  const auto heard = [&] {
+    post_system_notification(text("end"));
+    std::vector<std::string> names;
+    client::Event event;
+    while (!observer.next(event, kPatience) && event.name != "end") names.push_back(event.name);
+    return names;
+  };
+  using Names = std::vector<std::string>;
+  const PropertyValue domain = text("d"), key = text("k");
+  const auto set = [&](const PropertyValue& name, int value) {
+    EXPECT_EQ(data_ark_set(ark, domain, name, PropertyValue::integer(value)), 0);
+  };
+  set(key, 1);
+  EXPECT_EQ(heard(), Names{}) << "nobody has registered";
+  EXPECT_EQ(data_ark_register_notification(ark, domain, key, text("key set"), kEventSet | kEventRemoved), 0);
+  EXPECT_EQ(data_ark_register_notification(ark, domain, key, text("key changed"), kEventChanged), 0);
+  EXPECT_EQ(data_ark_register_notification(ark, domain, nullptr, text("domain"), kEventSet | kEventChanged), 0);
+  EXPECT_EQ(data_ark_register_notification(ark, domain, key, text("never"), 0), 0);
+  set(key, 2);
+  EXPECT_EQ(heard(), (Names{"key changed", "domain", "key set", "domain"}));
+  set(key, 2);
+  EXPECT_EQ(heard(), (Names{"key set", "domain"}));
+  set(text("other"), 1);
+  EXPECT_EQ(heard(), (Names{"domain", "domain"}));
+  EXPECT_EQ(data_ark_register_notification(ark, domain, key, text("key gone"), kEventRemoved), 0);
+  EXPECT_EQ(data_ark_remove(ark, domain, key), 0);
+  EXPECT_EQ(data_ark_remove(ark, domain, key), 0);
+  EXPECT_EQ(heard(), Names{"key gone"}) << "a later name replaces an earlier one, and only what is there is removed";
+  EXPECT_EQ(data_ark_exists(ark, domain, key), 0);
 }
 
-}  // namespace
+const std::string kTemporary = std::string(kDataFile) + ".XXXXXX";
+const std::string kSetAside = std::string(kDataFile) + ".unreadable";
+const std::string kFile = kDataFile;
+
+TEST(DataArkFile, HoldsWhatIsNeitherInClassOneNorSeven) {
+  ScratchRoot root;
+  root.write_plist(kFile, dictionary({{"-PhoneNumber", "1"},
+                                      {"-DebugDockPresent", true},
+                                      {"-kept", array({1, 2})},
+                                      {"com.Orvane.mobile.halvard.paired_hosts-old", "host"}}));
+  DataArk* ark = load_kept_ark();
+  apply_standard_key_classes(ark);
+  EXPECT_EQ(data_ark_copy(ark, nullptr, text("PhoneNumber")), text("1")) << "what is not saved again can be read";
+  EXPECT_EQ(data_ark_copy(ark, text("com.Orvane.mobile.backup"), text("Version")), text("2.0"));
+  data_ark_set(ark, text("com.Orvane.mobile.halvard.paired_hosts"), text("new"), text("host"));
+  data_ark_store(ark);
+  EXPECT_EQ(root.read_plist(kFile),
+            dictionary({{"-kept", array({1, 2})}, {"com.Orvane.mobile.halvard.paired_hosts-old", "host"}}));
+  EXPECT_EQ(root.mode_of(kFile), 0644u);
+  EXPECT_FALSE(root.exists(kTemporary));
+  root.expect_log({"data_ark_store: saved"});
+  extended_logging = 0;
+  data_ark_remove(ark, nullptr, text("kept"));
+  data_ark_remove(ark, text("com.Orvane.mobile.halvard.paired_hosts"), text("old"));
+  data_ark_store(ark);
+  EXPECT_FALSE(root.exists(kFile)) << "nothing is left to save";
+}
+
+TEST(DataArkFile, AFailedSaveLeavesTheFileAndIsTold) {
+  ScratchRoot root;
+  const PropertyValue before = dictionary({{"-kept", 1}});
+  root.write_plist(kFile, before);
+  DataArk* ark = load_kept_ark();
+  data_ark_set(ark, nullptr, text("new"), text("x"));
+  root.expect_log({"data_ark_set: dirtied by changing -new"});
+  root.make_directory(kTemporary);
+  data_ark_store(ark);
+  const auto lines = root.log_lines();
+  ASSERT_EQ(lines.size(), 5u);
+  EXPECT_EQ(lines[0], "_safe_open: open(" + kTemporary + ") failed: Is a directory");
+  EXPECT_EQ(lines[1], "store_dict: Could not create " + kTemporary + ": Is a directory");
+  EXPECT_EQ(lines[4], "data_ark_store: Could not store " + kTemporary);
+  EXPECT_EQ(root.read_plist(kFile), before);
+  root.remove(kTemporary);
+  root.remove(kFile);
+  root.make_directory(kFile);
+  data_ark_store(ark);
+  root.expect_log({"data_ark_store: Problem renaming " + kTemporary + ": Is a directory"});
+  EXPECT_EQ(root.read_plist(kTemporary), dictionary({{"-kept", 1}, {"-new", "x"}}));
+  root.remove(kFile);
+  data_ark_store(ark);
+  EXPECT_EQ(root.read_plist(kFile), dictionary({{"-kept", 1}, {"-new", "x"}}));
+  root.expect_log({"data_ark_store: saved"});
+}
+
+TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
+  const struct {
+    const char* name;
+    void (*put)(ScratchRoot&);
+  } cases[] = {
+      {"garbage", [](ScratchRoot& root) { root.write_file(kFile, "garbage"); }},
+      {"empty", [](ScratchRoot& root) { root.write_file(kFile, ""); }},
+      {"another root", [](ScratchRoot& root) { root.write_plist(kFile, array({1})); }},
+      {"directory", [](ScratchRoot& root) { root.make_directory(kFile); }},
+      {"dangling link", [](ScratchRoot& root) { root.make_link("/nowhere", kFile); }},
+      {"link",
+       [](ScratchRoot& root) {
+         root.write_plist("/private/var/mobile/elsewhere", dictionary({{"-a", 1}}));
+         root.make_link("../../elsewhere", kFile);
+       }},
+  };
+  ScratchRoot root;
+  for (const auto& [name, put] : cases) {
+    if (root.exists(kStateDirectory)) root.remove(kStateDirectory);
+    root.make_directory(kStateDirectory);
+    root.write_file(kSetAside, "older");
+    put(root);
+    const bool is_readable = std::filesystem::is_regular_file(root.path(kFile));
+    const std::string content = is_readable ? root.read_file(kFile) : "";
+    DataArk* ark = load_kept_ark();
+    EXPECT_EQ(root.log_lines().back(), "data_ark_load: Could not load " + kFile) << name;
+    data_ark_store(ark);
+    EXPECT_EQ(root.log_lines().back(), "data_ark_store: " + kFile + " could not be loaded, left it where it is");
+    EXPECT_TRUE(root.exists(kFile)) << name;
+    data_ark_set(ark, nullptr, text("new"), text("x"));
+    data_ark_store(ark);
+    const auto lines = root.log_lines();
+    ASSERT_GE(lines.size(), 2u);
+    EXPECT_EQ(lines[1], "data_ark_store: " + kFile + " could not be loaded, set it aside as " + kSetAside) << name;
+    EXPECT_EQ(root.read_plist(kFile), dictionary({{"-new", "x"}})) << name;
+    ASSERT_TRUE(root.exists(kSetAside)) << name;
+    EXPECT_TRUE(!is_readable || root.read_file(kSetAside) == content) << name;
+  }
+}
+
+TEST(LiveAnswers, EveryRowIsFoundByItsOwnDomainAndKeyOnly) {
+  for (const larry_info& row : kLiveAnswers) {
+    const PropertyValue domain = row.domain.empty() ? PropertyValue{} : text(row.domain);
+    ASSERT_EQ(find_live_answer(domain, text(row.key)), &row) << row.key;
+    EXPECT_EQ(find_live_answer(text("other"), text(row.key)), nullptr);
+    EXPECT_EQ(find_live_answer(text(""), text(row.key)), nullptr) << "an empty domain is a domain";
+    EXPECT_EQ(find_live_answer(domain, text(std::string(row.key) + "x")), nullptr);
+  }
+  EXPECT_EQ(find_live_answer(nullptr, text("BatteryIsCharging")), nullptr);
+  EXPECT_EQ(find_live_answer(nullptr, nullptr), nullptr);
+  EXPECT_EQ(find_live_answer(PropertyValue::integer(1), text("DieID")), &kLiveAnswers[37]) << "no string is no domain";
+}
+
+TEST(LiveAnswers, AreAskedAnewAndNeverStored) {
+  ScratchRoot root;
+  root.make_directory(kStateDirectory);
+  DataArk* ark = load_kept_ark();
+  const auto answer = [&](const char* version) {
+    root.write_plist("/etc/quorvel/device_information.plist", dictionary({{"ProductVersion", version}}));
+    return data_ark_copy(ark, nullptr, text("ProductVersion"));
+  };
+  data_ark_set(ark, nullptr, text("ProductVersion"), text("stored"));
+  data_ark_set(ark, nullptr, text("MarketingName"), text("stored"));
+  static_cast<void>(root.log_lines());
+  EXPECT_EQ(answer("1.0"), text("1.0"));
+  EXPECT_EQ(answer("1.1"), text("1.1"));
+  EXPECT_EQ(data_ark_exists(ark, nullptr, text("ProductVersion")), 1);
+  EXPECT_EQ(data_ark_exists(ark, nullptr, text("DieID")), 0);
+  EXPECT_FALSE(data_ark_copy(ark, nullptr, text("MarketingName")));
+  EXPECT_FALSE(data_ark_copy(ark, nullptr, text("DieID")));
+  root.expect_log(
+      {"data_ark_copy_with_conn_state: the device-information service returned nothing for "
+       "kVeritomeQMarketingNameString",
+       "data_ark_copy_with_conn_state: the device-information service returned nothing for "
+       "kVeritomeQDieId"});
+}
+
 }  // namespace quorvel::test

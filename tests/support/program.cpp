@@ -1,31 +1,17 @@
 #include "support/program.h"
 
-#include <fcntl.h>
-#include <gtest/gtest.h>
 #include <poll.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
-#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/un.h>
 #include <sys/wait.h>
-#include <unistd.h>
 
-#include <algorithm>
 #include <array>
-#include <atomic>
-#include <csignal>
-#include <cstdio>
-#include <cstring>
-#include <filesystem>
-#include <stdexcept>
-#include <system_error>
 
 namespace quorvel::test {
 namespace {
-
-constexpr int kFirstPassedDescriptor = 3;
 
 int checked(long result, const char* what) {
   if (result < 0) throw std::system_error(errno, std::generic_category(), what);
@@ -34,9 +20,8 @@ int checked(long result, const char* what) {
 
 Descriptor memory_file(const char* name, std::string_view content = {}) {
   Descriptor file(checked(::memfd_create(name, MFD_CLOEXEC), "memfd_create"));
-  if (::pwrite(file.get(), content.data(), content.size(), 0) != static_cast<ssize_t>(content.size())) {
+  if (::pwrite(file.get(), content.data(), content.size(), 0) != static_cast<ssize_t>(content.size()))
     checked(-1, "a program's input");
-  }
   return file;
 }
 
@@ -85,9 +70,6 @@ struct Launch {
   std::vector<char*> arguments;
   std::vector<char*> environment;
   std::array<int, 3> standard;
-  int listening_socket;
-  char* listen_pid;
-  std::size_t listen_pid_size;
 };
 
 [[noreturn]] void become_program(const Launch& launch) {
@@ -96,11 +78,6 @@ struct Launch {
   sigemptyset(&none);
   ::sigprocmask(SIG_SETMASK, &none, nullptr);
   for (int i = 0; i < 3; ++i) ::dup2(launch.standard[static_cast<std::size_t>(i)], i);
-  if (launch.listening_socket >= 0) {
-    ::dup2(launch.listening_socket, kFirstPassedDescriptor);
-    ::fcntl(kFirstPassedDescriptor, F_SETFD, 0);
-    std::snprintf(launch.listen_pid, launch.listen_pid_size, "LISTEN_PID=%d", ::getpid());
-  }
   ::execve(launch.arguments[0], launch.arguments.data(), launch.environment.data());
   ::_exit(127);
 }
@@ -109,15 +86,10 @@ pid_t launch_program(const std::string& path, const ProgramOptions& options, con
                      std::array<int, 3> standard) {
   auto changes = options.environment;
   changes.emplace_back("NOTIFY_SOCKET", notify_path);
-  if (options.listening_socket >= 0) {
-    changes.emplace_back("LISTEN_FDS", "1");
-    changes.emplace_back("LISTEN_PID", std::string(10, '0'));
-  }
   std::vector<std::string> arguments = options.arguments;
   arguments.insert(arguments.begin(), path);
   std::vector<std::string> environment = environment_with(changes);
-  const Launch launch{pointers_to(arguments),   pointers_to(environment),  standard,
-                      options.listening_socket, environment.back().data(), environment.back().size() + 1};
+  const Launch launch{pointers_to(arguments), pointers_to(environment), standard};
   const pid_t pid = checked(::fork(), "fork");
   if (pid == 0) become_program(launch);
   return pid;
@@ -171,10 +143,8 @@ bool Program::wait_until_ready(std::chrono::milliseconds patience) {
     if (milliseconds <= 0 || ::poll(watched, 2, static_cast<int>(milliseconds)) == 0) return false;
     char message[256];
     const ssize_t size = ::recv(notify_.get(), message, sizeof message, 0);
-    if (size > 0 &&
-        std::string_view(message, static_cast<std::size_t>(size)).find("READY=1") != std::string_view::npos) {
+    if (size > 0 && std::string_view(message, static_cast<std::size_t>(size)).find("READY=1") != std::string_view::npos)
       return true;
-    }
     if (size < 0 && watched[1].revents != 0) return false;
   }
 }

@@ -1,16 +1,8 @@
 // The built programs, run as a user would run them. They inherit this process's environment, QUORVEL_ROOT included.
 #pragma once
 
-#include <sys/types.h>
-
-#include <chrono>
-#include <string>
-#include <string_view>
-#include <utility>
-#include <vector>
-
 #include "platform/descriptor.h"
-#include "support/waiting.h"
+#include "support/watching.h"
 
 namespace quorvel::test {
 
@@ -29,7 +21,6 @@ struct ProgramOptions {
   std::vector<std::string> arguments = {};
   std::string input;                                                  ///< what the program finds on its standard input
   std::vector<std::pair<std::string, std::string>> environment = {};  ///< set on top of this process's
-  int listening_socket = -1;  ///< handed over as a service manager does; stays the caller's
 };
 
 /// A program that was started. Its output is kept aside, so it never blocks for want of a reader. It does not outlive
@@ -39,8 +30,6 @@ class Program {
   explicit Program(const std::string& path, const ProgramOptions& options = {});
   /// Kills the program if it still runs.
   ~Program();
-  Program(const Program&) = delete;
-  Program& operator=(const Program&) = delete;
 
   /// Waits until the program reports that it is ready; false when it ends before, or is not ready within `patience`.
   [[nodiscard]] bool wait_until_ready(std::chrono::milliseconds patience = kPatience);

@@ -1,22 +1,8 @@
 #include "support/scratch_root.h"
 
-#include <gtest/gtest.h>
-#include <sys/stat.h>
-
-#include <algorithm>
-#include <cerrno>
-#include <cstdio>
-#include <cstdlib>
 #include <fstream>
-#include <iterator>
-#include <span>
-#include <sstream>
-#include <stdexcept>
-#include <system_error>
-#include <utility>
 
 #include "platform/property/binary.h"
-#include "support/values.h"
 
 namespace quorvel::test {
 namespace {
@@ -65,10 +51,9 @@ ScratchRoot::ScratchRoot(const std::string& folder) : scratch_(make_scratch_dire
 }
 
 ScratchRoot::~ScratchRoot() {
-  if (!log_ignored_) {
+  if (!log_ignored_)
     for (const std::string& line : lines_behind_read(whole_log()))
       ADD_FAILURE() << "a line in the log that nobody expected: " << line;
-  }
   std::error_code error;
   fs::remove_all(scratch_, error);
 }

@@ -1,16 +1,8 @@
 // A device root in a scratch directory, made for one test and deleted at its end.
 #pragma once
 
-#include <sys/types.h>
-
-#include <filesystem>
-#include <initializer_list>
-#include <string>
-#include <string_view>
-#include <vector>
-
-#include "platform/property/value.h"
-#include "support/waiting.h"
+#include "support/values.h"
+#include "support/watching.h"
 
 namespace quorvel::test {
 

@@ -1,10 +1,7 @@
 #include "support/values.h"
 
 #include <ostream>
-#include <span>
-#include <stdexcept>
 
-#include "platform/property/binary.h"
 #include "platform/property/byte_buffer.h"
 #include "platform/property/description.h"
 
@@ -13,17 +10,15 @@ namespace test {
 
 PropertyValue dictionary(std::initializer_list<std::pair<std::string_view, Value>> entries) {
   PropertyValue result = PropertyValue::dictionary(entries.size());
-  for (const auto& [key, value] : entries) {
+  for (const auto& [key, value] : entries)
     if (!result.set(key, value.value())) throw std::runtime_error("no entry could be made for " + std::string(key));
-  }
   return result;
 }
 
 PropertyValue array(std::initializer_list<Value> elements) {
   PropertyValue result = PropertyValue::array(elements.size());
-  for (const Value& element : elements) {
+  for (const Value& element : elements)
     if (!result.append(element.value())) throw std::runtime_error("an array element could not be made");
-  }
   return result;
 }
 
@@ -45,6 +40,28 @@ std::string encoded(const PropertyValue& value) {
   ByteBuffer out;
   if (!write_binary(value, out)) throw std::runtime_error("not to be encoded: " + described(value));
   return {reinterpret_cast<const char*>(out.data()), out.size()};
+}
+
+const char* round_trip_fault(const PropertyValue& value) {
+  if (!(value == value)) return "does not equal itself";
+  char room[512];
+  TextSink sink(room);
+  describe(value, sink);
+  if (std::any_of(room, sink.position(), [](char c) { return c >= 0 && c < ' '; })) return "breaks its line";
+  if (value.is_container() && !(value.mutable_copy() == value)) return "its mutable copy differs";
+  ByteBuffer once, twice;
+  if (!write_binary(value, once)) return "cannot be written";
+  const PropertyValue again = read_binary(once.bytes(), Mutability::mutable_containers);
+  if (!again) return "cannot be read again";
+  if (!(again == value)) return "differs when it is read again";
+  if (!write_binary(again, twice)) return "cannot be written again";
+  if (!std::ranges::equal(once.bytes(), twice.bytes())) return "is written in other bytes";
+  return nullptr;
+}
+
+const char* round_trip_fault(std::span<const std::byte> file, Mutability mutability) {
+  const PropertyValue value = read_binary(file, mutability);
+  return value ? round_trip_fault(value) : nullptr;
 }
 
 }  // namespace test

@@ -4,14 +4,9 @@
 //   EXPECT_EQ(root.read_plist("/some/file.plist"), expected);
 #pragma once
 
-#include <concepts>
-#include <initializer_list>
-#include <iosfwd>
-#include <string>
-#include <string_view>
-#include <utility>
-
+#include "platform/property/binary.h"
 #include "platform/property/value.h"
+#include "support/prelude.h"
 
 namespace quorvel {
 
@@ -46,6 +41,13 @@ class Value {
 
 /// The binary encoding of a value.
 [[nodiscard]] std::string encoded(const PropertyValue& value);
+
+/// Takes `value` through everything that a value must survive: mutable copy, comparison, description, writing, reading
+/// again and writing again. Returns what went wrong, or null.
+[[nodiscard]] const char* round_trip_fault(const PropertyValue& value);
+
+/// Reads `file`, and takes what it holds, if anything, through the same.
+[[nodiscard]] const char* round_trip_fault(std::span<const std::byte> file, Mutability mutability);
 
 }  // namespace test
 }  // namespace quorvel

@@ -19,19 +19,19 @@ constexpr int kBadConfiguration = 78;
 
 }  // namespace
 
-void use_device_root(const std::string& directory, int status) {
-  if (!directory.empty()) {
+void use_device_root(const std::optional<std::string>& directory, int status) {
+  if (directory) {
     std::error_code error;
-    const std::filesystem::path path = std::filesystem::absolute(directory, error);
+    const std::filesystem::path path = std::filesystem::absolute(*directory, error);
     if (error || ::setenv("QUORVEL_ROOT", path.c_str(), 1) != 0) {
-      throw Failure{status, "--root \"" + directory + "\" cannot be used: " + error.message()};
+      throw Failure{status, "--root \"" + *directory + "\" cannot be used: " + error.message()};
     }
   }
   if (Descriptor(platform::open_file("/", O_PATH | O_DIRECTORY, 0))) return;
   const std::string reason = std::strerror(errno);
-  if (!directory.empty()) {
-    throw Failure{status, "--root \"" + directory + "\": " + reason +
-                              ". Make a device root with: quorvelctl root create " + directory};
+  if (directory) {
+    throw Failure{status, "--root \"" + *directory + "\": " + reason +
+                              ". Make a device root with: quorvelctl root create " + *directory};
   }
   const char* value = std::getenv("QUORVEL_ROOT");
   throw Failure{kBadConfiguration, std::string("QUORVEL_ROOT is \"") + (value != nullptr ? value : "") +

@@ -72,7 +72,9 @@ int parse_and_run(int count, char** words) {
     note(describe(app, error));
     return kWrongWords;
   }
-  if (line.uses_root) use_device_root(line.root, kWrongWords);
+  // An empty word, as of a variable that is not set, is no way to ask for the machine's own root.
+  const bool chosen = app.count("--root") > 0;
+  if (line.uses_root) use_device_root(chosen ? std::optional(line.root) : std::nullopt, kWrongWords);
   return line.run();
 }
 

@@ -80,7 +80,7 @@ int run(int count, char** words) {
     if (error.get_exit_code() == 0) return app.exit(error);
     throw Failure{kUsage, std::string(error.what()) + ". See: telvane-sim --help"};
   }
-  use_device_root(root, kConfiguration);
+  use_device_root(app.count("--root") > 0 ? std::optional(root) : std::nullopt, kConfiguration);
   serve();
   return 0;
 }

@@ -1,8 +1,8 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <charconv>
 #include <climits>
-#include <cstdio>
 #include <cstring>
 #include <string_view>
 
@@ -17,8 +17,9 @@ constexpr std::string_view kRemovedSuffix = " (deleted)";
 
 // The path that the kernel reports for an open object, in `buffer`; empty with errno set when there is none.
 [[nodiscard]] std::string_view reported_path(int descriptor, char (&buffer)[PATH_MAX + 1]) noexcept {
-  char link[sizeof "/proc/self/fd/" + 10];
-  std::snprintf(link, sizeof link, "/proc/self/fd/%d", descriptor);
+  constexpr std::string_view directory = "/proc/self/fd/";
+  char link[directory.size() + 12] = "/proc/self/fd/";
+  *std::to_chars(link + directory.size(), link + sizeof link - 1, descriptor).ptr = '\0';
   const ssize_t length = ::readlink(link, buffer, sizeof buffer);
   if (length < 0) return {};
   if (static_cast<std::size_t>(length) == sizeof buffer) {
@@ -48,9 +49,11 @@ int descriptor_path(int descriptor, char* path, std::size_t size) noexcept {
   if (found.empty()) return -1;
   // The status is asked for after the path: an object that is removed between the two was not yet marked as such, while
   // the other order could meet the mark with a count from before.
-  struct stat status;
-  if (::fstat(descriptor, &status) != 0) return -1;
-  if (status.st_nlink == 0 && found.ends_with(kRemovedSuffix)) found.remove_suffix(kRemovedSuffix.size());
+  if (found.ends_with(kRemovedSuffix)) {
+    struct stat status;
+    if (::fstat(descriptor, &status) != 0) return -1;
+    if (status.st_nlink == 0) found.remove_suffix(kRemovedSuffix.size());
+  }
   found = seen_from_root(found);
   if (found.empty()) return -1;
   if (found.size() >= size) {

@@ -33,9 +33,8 @@ struct LocalAddress {
 // The address of an open object, or with a name, of an entry of an open directory.
 [[nodiscard]] bool make_address(int descriptor, std::string_view name, LocalAddress& out) noexcept {
   out.address.sun_family = AF_UNIX;
-  const int length =
-      std::snprintf(out.address.sun_path, sizeof out.address.sun_path, "/proc/self/fd/%d%s%.*s", descriptor,
-                    name.empty() ? "" : "/", static_cast<int>(name.size()), name.data());
+  const int length = std::snprintf(out.address.sun_path, sizeof out.address.sun_path, "/proc/self/fd/%d%s%.*s",
+                                   descriptor, name.empty() ? "" : "/", static_cast<int>(name.size()), name.data());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof out.address.sun_path) {
     errno = ENAMETOOLONG;
     return false;
@@ -77,9 +76,8 @@ Descriptor open_service_directory() noexcept {
 // The socket itself is opened for its address: a link in its place is then taken inside the device root.
 Descriptor connect_local(std::string_view name) noexcept {
   char path[kPathSize];
-  const int length =
-      std::snprintf(path, sizeof path, "%.*s/%.*s", static_cast<int>(wire::kServiceDirectory.size()),
-                    wire::kServiceDirectory.data(), static_cast<int>(name.size()), name.data());
+  const int length = std::snprintf(path, sizeof path, "%.*s/%.*s", static_cast<int>(wire::kServiceDirectory.size()),
+                                   wire::kServiceDirectory.data(), static_cast<int>(name.size()), name.data());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof path) {
     errno = ENAMETOOLONG;
     return Descriptor();
@@ -94,9 +92,7 @@ Descriptor connect_local(std::string_view name) noexcept {
   return result == 0 || errno == EISCONN ? std::move(socket) : Descriptor();
 }
 
-bool is_served(std::string_view name) noexcept {
-  return connect_local(name) || errno == EAGAIN;
-}
+bool is_served(std::string_view name) noexcept { return connect_local(name) || errno == EAGAIN; }
 
 ListeningSocket& ListeningSocket::operator=(ListeningSocket&& other) noexcept {
   std::swap(socket_, other.socket_);

@@ -205,7 +205,10 @@ bool Reader::take_reference(const std::byte* at, Word& word) const noexcept {
 bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept {
   Object object;
   if (!layout_.object_at(layout_.offset_of(frame.object), object)) return false;
-  const std::uint64_t references = object.size * (object.kind == format::kDictionary ? 2 : 1);
+  // Keys are texts, or refused when the dictionary is made: only its values can be containers.
+  const std::uint64_t first = object.kind == format::kDictionary ? object.size : 0;
+  const std::uint64_t references = first + object.size;
+  frame.next = std::max(frame.next, first);
   for (; frame.next < references; ++frame.next) {
     const std::byte* at = object.body + frame.next * layout_.reference_size();
     Word word = 0;

@@ -1,13 +1,10 @@
-// Paths are resolved inside the device root, whatever links and dots they go through.
-#include <gtest/gtest.h>
-
-#include <cerrno>
-#include <cstring>
-#include <string>
-
+// Paths are resolved inside the device root, whatever links and dots they go through; and the small sources there:
+// preferences, device information and the hardware registry.
 #include "platform/descriptor.h"
+#include "platform/device_information.h"
 #include "platform/file_system.h"
-#include "support/descriptors.h"
+#include "platform/hardware_registry.h"
+#include "platform/preferences.h"
 #include "support/scratch_root.h"
 
 namespace quorvel::test {
@@ -111,6 +108,50 @@ TEST(DeviceRoot, NeverReportsACutPathOrOneOutside) {
   const std::string sibling = root.path().string() + "x";
   const Descriptor beside(::open(sibling.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600));
   EXPECT_EQ(reported_path(beside), std::strerror(ENOENT));
+}
+
+using namespace platform;
+
+constexpr const char* kPreferences = "/private/var/mobile/Library/Preferences/com.example.plist";
+constexpr const char* kAnswers = "/etc/quorvel/device_information.plist";
+
+TEST(SmallSources, AnswerFromTheFilesAsTheyAreNow) {
+  ScratchRoot root;
+  EXPECT_EQ(copy_preference("Key", "com.example"), PropertyValue());
+  root.write_plist(kPreferences, dictionary({{"Key", 7}, {"Flag", true}}));
+  EXPECT_EQ(copy_preference("Key", "com.example"), PropertyValue::integer(7));
+  EXPECT_TRUE(has_integer_preference("Key", "com.example"));
+  EXPECT_FALSE(has_integer_preference("Flag", "com.example"));
+  for (const std::string& domain : {std::string("../Preferences/com.example"), std::string("com.example\0", 12),
+                                    std::string(), std::string(5000, 'd')})
+    EXPECT_EQ(copy_preference("Key", domain), PropertyValue()) << domain;
+  root.write_plist(kAnswers, dictionary({{"ProductType", "One"}}));
+  EXPECT_EQ(copy_device_answer("ProductType"), text("One"));
+  root.write_plist(kAnswers, dictionary({{"ProductType", "Two"}}));
+  EXPECT_EQ(copy_device_answer("ProductType"), text("Two"));
+  EXPECT_EQ(copy_device_answer("Other"), PropertyValue());
+  for (const std::string& content : {std::string("rubbish"), encoded(array({"ProductType"}))}) {
+    root.write_file(kAnswers, content);
+    EXPECT_EQ(copy_device_answer("ProductType"), PropertyValue());
+  }
+}
+
+TEST(HardwareRegistry, PropertiesAreFilesOfTheEntry) {
+  ScratchRoot root;
+  const std::string entry_path = "/sys/firmware/devicetree/base/baseband/";
+  root.write_file(entry_path + "class", std::string_view("\x02\0\0\0", 4));
+  root.write_file(entry_path + "large", std::string((64u << 10) + 1, 'x'));
+  root.write_file(entry_path + "child/name", "x");
+  root.make_fifo(entry_path + "fifo");
+  root.make_link("/etc", entry_path + "link");
+  const RegistryEntry entry = RegistryEntry::open("IODeviceTree:/baseband");
+  ASSERT_TRUE(entry);
+  EXPECT_EQ(entry.copy_property("class"), data(std::string_view("\x02\0\0\0", 4)));
+  for (const std::string_view name : {"missing", "large", "child", "child/name", "..", "", "fifo", "link"})
+    EXPECT_EQ(entry.copy_property(name), PropertyValue()) << name;
+  EXPECT_FALSE(RegistryEntry::open("IODeviceTree:/missing"));
+  EXPECT_FALSE(RegistryEntry::open("IODeviceTree:/baseband/class"));
+  EXPECT_FALSE(RegistryEntry::open("/baseband"));
 }
 
 }  // namespace

@@ -1,19 +1,9 @@
-// What must hold before the daemon logs its first line, and what keeps it from starting.
-#include <fcntl.h>
-#include <gtest/gtest.h>
-#include <sys/file.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <csignal>
-#include <cstdlib>
-#include <string>
-
+// What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
 #include "platform/host/local_socket.h"
-#include "platform/host/socket_peer.h"
+#include "platform/notification_center.h"
 #include "platform/process.h"
 #include "support/scratch_root.h"
+#include "support/socket_peer.h"
 
 namespace quorvel::test {
 namespace {
@@ -57,11 +47,6 @@ TEST(ProcessStart, RefusesASecondInstance) {
   ScratchRoot root;
   root.make_directory("/run/quorvel");
   {
-    const Descriptor lock(::open(root.path("/run/quorvel/quorveld.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
-    ASSERT_EQ(::flock(lock.get(), LOCK_EX), 0);
-    EXPECT_START(69, "^quorveld: another quorveld is running [^\n]*\n$");
-  }
-  {
     const Descriptor live = listen_on(kSocket);
     EXPECT_START(69, "^quorveld: another process serves com.example.service.sock\n$");
     EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
@@ -103,6 +88,72 @@ TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
   EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));
   EXPECT_FALSE(ListeningSocket::open(std::string(100, 'n')));
   EXPECT_EQ(errno, ENAMETOOLONG);
+}
+
+using platform::post_notification;
+using wire::FrameKind;
+
+class NotificationCenter : public testing::Test {
+ protected:
+  NotificationCenter() { EXPECT_EQ(platform::start_process(), 0); }
+
+  static SocketPeer observer() { return SocketPeer::connected_to("notifications.sock"); }
+
+  ScratchRoot root;
+};
+
+TEST_F(NotificationCenter, WhoeverIsConnectedBeforeAPostReceivesIt) {
+  const std::size_t open_before = descriptors_open();
+  for (std::int64_t i = 1; i <= 300; ++i) {
+    SocketPeer peer = observer();
+    post_notification(text("com.example.changed"), PropertyValue::integer(i));
+    const auto ready = peer.receive();
+    ASSERT_TRUE(ready);
+    ASSERT_EQ(ready->kind, FrameKind::ready);
+    std::uint64_t serial = ready->serial;
+    while (serial < static_cast<std::uint64_t>(i)) {
+      const auto notification = peer.receive();
+      ASSERT_TRUE(notification) << "notification " << i << " after ready " << ready->serial;
+      ASSERT_EQ(notification->kind, FrameKind::notification);
+      ASSERT_EQ(notification->serial, ++serial);
+      EXPECT_EQ(notification->name, "com.example.changed");
+      EXPECT_EQ(notification->value, PropertyValue::integer(static_cast<std::int64_t>(serial)));
+    }
+    ASSERT_LE(ready->serial, static_cast<std::uint64_t>(i - 1));
+  }
+  EXPECT_TRUE(eventually([&] { return descriptors_open() == open_before; }));
+}
+
+TEST_F(NotificationCenter, ASlowObserverIsToldHowManyItMissed) {
+  SocketPeer slow = observer();
+  SocketPeer rude = observer();
+  static_cast<void>(rude.send(std::string(50'000, '?')));
+  const PropertyValue object = text(std::string(1000, 'o'));
+  constexpr std::uint64_t count = 10'000;
+  for (std::uint64_t i = 1; i < count; ++i) {
+    // One that has no name on the wire counts like the others.
+    post_notification(i == count - 3 ? text("a\nb") : text("name"), object);
+  }
+  post_notification(text("last"), nullptr);
+  for (SocketPeer* peer : {&slow, &rude}) {
+    std::uint64_t serial = peer->receive()->serial;
+    std::uint64_t missed = 0;
+    while (serial < count) {
+      const auto frame = peer->receive();
+      ASSERT_TRUE(frame) << "after " << serial;
+      if (frame->kind == FrameKind::missed) {
+        missed += *frame->value.to_uint64();
+        serial += *frame->value.to_uint64();
+      } else {
+        ++serial;
+      }
+      ASSERT_EQ(frame->serial, serial);
+      EXPECT_EQ(frame->name == "last", serial == count);
+    }
+    EXPECT_GT(missed, 1000u);
+  }
+  SocketPeer late = observer();
+  EXPECT_EQ(late.receive()->serial, count);
 }
 
 }  // namespace

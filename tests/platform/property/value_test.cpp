@@ -1,10 +1,6 @@
-#include "platform/property/value.h"
-
-#include <gtest/gtest.h>
-
-#include <map>
 #include <random>
 
+#include "platform/property/description.h"
 #include "support/values.h"
 
 namespace quorvel::test {
@@ -63,25 +59,13 @@ TEST(Value, EntriesKeepTheirOrder) {
 }
 
 TEST(Value, EqualityLooksAtKindAndContent) {
-  const PropertyValue different[] = {PropertyValue::integer(1),
-                                     PropertyValue::real(1),
-                                     PropertyValue::boolean(true),
-                                     PropertyValue::date(1),
-                                     text("1"),
-                                     data("1"),
-                                     array({1}),
-                                     dictionary({{"1", 1}}),
-                                     PropertyValue::real(0.0),
-                                     PropertyValue::real(-0.0),
-                                     PropertyValue::integer(-1),
-                                     PropertyValue::unsigned_integer(~std::uint64_t{0}),
-                                     dictionary({{"1", 2}}),
-                                     array({1, 1}),
-                                     dictionary({{"2", 1}}),
-                                     PropertyValue{}};
-  for (std::size_t i = 0; i < std::size(different); ++i) {
-    for (std::size_t j = 0; j < std::size(different); ++j) EXPECT_EQ(different[i] == different[j], i == j) << i << j;
-  }
+  const PropertyValue one = PropertyValue::integer(1), most = PropertyValue::unsigned_integer(~std::uint64_t{0});
+  const Value different[] = {one, 1.0, true, "1", 0.0, -0.0, -1, most, data("1"), array({1}), array({1, 1})};
+  std::vector<PropertyValue> values = {PropertyValue{}, PropertyValue::date(1), dictionary({{"1", 1}}),
+                                       dictionary({{"1", 2}}), dictionary({{"2", 1}})};
+  for (const Value& value : different) values.push_back(value.value());
+  for (std::size_t i = 0; i < values.size(); ++i)
+    for (std::size_t j = 0; j < values.size(); ++j) EXPECT_EQ(values[i] == values[j], i == j) << i << ' ' << j;
   EXPECT_EQ(dictionary({{"a", 1}, {"b", 2}}), dictionary({{"b", 2}, {"a", 1}}));
   EXPECT_EQ(PropertyValue::real(__builtin_nan("")), PropertyValue::real(__builtin_nan("")));
 }
@@ -96,6 +80,51 @@ TEST(Value, RefusesWhatItCannotHold) {
   EXPECT_FALSE(value.append(PropertyValue::integer(1)));
   EXPECT_FALSE(text("a").set("b", PropertyValue::integer(1)));
   EXPECT_EQ(value.size(), 0u);
+}
+
+TEST(Description, IsOneLineThatAReaderUnderstands) {
+  const struct {
+    PropertyValue value;
+    std::string_view expected;
+  } cases[] = {
+      {nullptr, "(null)"},
+      {text("Gerät"), "Gerät"},
+      {text("a\nb\r\t\x1b[2J\x7f"), "a\\nb\\r\\t\\x1b[2J\\x7f"},
+      {text("\u0085\u2028"), "\\xc2\\x85\\xe2\\x80\\xa8"},
+      {text(std::string_view("nul\0", 4)), "nul\\x00"},
+      {text("100%s \"q\""), "100%s \"q\""},
+      {PropertyValue::integer(-7), "-7"},
+      {PropertyValue::unsigned_integer(~std::uint64_t{0}), "18446744073709551615"},
+      {PropertyValue::boolean(false), "false"},
+      {PropertyValue::real(2), "2.0"},
+      {PropertyValue::real(-0.1), "-0.1"},
+      {PropertyValue::real(1e300), "1e+300"},
+      {PropertyValue::date(0), "2001-01-01T00:00:00Z"},
+      {PropertyValue::date(-978'307'200), "1970-01-01T00:00:00Z"},
+      {PropertyValue::date(99'792'000.25), "2004-03-01T00:00:00.250Z"},
+      {PropertyValue::date(252'423'993'599), "9999-12-31T23:59:59Z"},
+      {PropertyValue::date(1e300), "date 1e+300"},
+      {data(""), "<0 bytes>"},
+      {data("\x89PNG"), "<89504e47 4 bytes>"},
+      {data("0123456789abcdefg"), "<30313233 34353637 38396162 63646566 … 17 bytes>"},
+      {array({}), "[]"},
+      {dictionary({{"k\"\n", array({"v", 1})}}), R"({"k\"\n": ["v", 1]})"},
+  };
+  for (const auto& [value, expected] : cases) EXPECT_EQ(described(value), expected);
+}
+
+TEST(Description, IsCutBetweenCharacters) {
+  for (std::size_t room = 1; room < 12; ++room) {
+    char buffer[12];
+    TextSink sink(std::span(buffer, room));
+    describe(text("aä€😀b"), sink);
+    const std::string_view whole = "aä€😀b";
+    const std::string_view cut(buffer, static_cast<std::size_t>(sink.position() - buffer));
+    EXPECT_TRUE(whole.starts_with(cut));
+    EXPECT_EQ(sink.full(), room < whole.size());
+    EXPECT_TRUE(PropertyValue::string(cut)) << room;
+    EXPECT_GT(cut.size() + 4, room);
+  }
 }
 
 }  // namespace
