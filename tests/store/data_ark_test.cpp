@@ -134,7 +134,7 @@ TEST(RegisteredNotifications, ArePostedForTheirEventsOnly) {
   root.ignore_log();
   root.make_directory(kStateDirectory);
   ASSERT_EQ(platform::start_process(), 0);
-  DataArk* ark = data_ark_load();
+  DataArk* ark = load_kept_ark();
   client::Observer observer;
   ASSERT_FALSE(observer.connect());
   const auto heard = [&] {
