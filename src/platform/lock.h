@@ -17,7 +17,6 @@
 
 #define QUORVEL_GUARDED_BY(x) QUORVEL_THREAD_ANNOTATION(guarded_by(x))
 #define QUORVEL_REQUIRES(...) QUORVEL_THREAD_ANNOTATION(requires_capability(__VA_ARGS__))
-#define QUORVEL_EXCLUDES(...) QUORVEL_THREAD_ANNOTATION(locks_excluded(__VA_ARGS__))
 
 namespace quorvel {
 

@@ -1,7 +1,6 @@
 #include "platform/property/leaf_table.h"
 
 #include <algorithm>
-#include <bit>
 
 namespace quorvel::detail {
 
@@ -32,11 +31,6 @@ bool same_leaf(Word left, Word right) noexcept {
 }
 
 }  // namespace
-
-bool LeafTable::reserve(std::size_t more) noexcept {
-  const std::size_t size = std::bit_ceil((used_ + more) * 2);
-  return size <= size_ || resize(size);
-}
 
 bool LeafTable::resize(std::size_t size) noexcept {
   auto* slots = static_cast<IndexSlot*>(std::calloc(size, sizeof(IndexSlot)));

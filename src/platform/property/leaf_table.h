@@ -18,9 +18,6 @@ class LeafTable {
   LeafTable& operator=(const LeafTable&) = delete;
   ~LeafTable() { std::free(slots_); }
 
-  /// Makes room for `more` leaves, so that they are taken in without moving the others. False when memory runs out.
-  [[nodiscard]] bool reserve(std::size_t more) noexcept;
-
   /// Looks up a leaf equal to `leaf` and sets `number` to its number; when there is none, takes `leaf` in under
   /// `number`. `objects` are the numbered leaves.
   [[nodiscard]] Outcome find_or_add(Word leaf, const Word* objects, std::uint32_t& number) noexcept;
