@@ -21,7 +21,10 @@ constexpr std::size_t kObserverShare = 4;  // one in four
 
 }  // namespace
 
-std::size_t client_connection_limit() noexcept { return connection_limit() - connection_limit() / kObserverShare; }
+std::size_t client_connection_limit() noexcept {
+  const std::size_t limit = connection_limit();
+  return limit - limit / kObserverShare;
+}
 
 std::size_t observer_connection_limit() noexcept {
   return std::max<std::size_t>(connection_limit() / kObserverShare, 1);

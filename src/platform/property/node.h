@@ -173,9 +173,8 @@ inline void release(Word word) noexcept {
   }
 }
 
-/// Retains or releases a run of words, counting a run of leaves of one block at once.
+/// Retains a run of words, counting a run of leaves of one block at once.
 void retain_all(const Word* words, std::size_t count) noexcept;
-void release_all(const Word* words, std::size_t count) noexcept;
 
 /// An empty container with room for `capacity` slots in the same allocation, or null when memory runs out.
 [[nodiscard]] ArrayNode* new_array(std::size_t capacity, std::uint8_t flags) noexcept;

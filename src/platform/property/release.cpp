@@ -106,12 +106,6 @@ void release_block(Block* block, std::uint64_t references) noexcept {
   if (block->count.fetch_sub(references, std::memory_order_acq_rel) == references) std::free(block);
 }
 
-void release_all(const Word* words, std::size_t count) noexcept {
-  ContainerNode* condemned = nullptr;
-  drop_words(words, count, condemned);
-  release_condemned(condemned);
-}
-
 void retain_all(const Word* words, std::size_t count) noexcept {
   BlockRun<Take> run;
   for (std::size_t i = 0; i < count; ++i) {
