@@ -49,9 +49,9 @@ bool read_whole(const Descriptor& file, ByteBuffer& buffer) noexcept {
 
 enum class Durability { ordinary, flushed };
 
-int store(const char* path, const PropertyValue& value, Durability durability) noexcept {
+int store(const char* path, const PropertyValue& value, const OmittedEntries& omitted, Durability durability) noexcept {
   ByteBuffer bytes;
-  if (!write_binary(value, bytes)) {
+  if (!write_binary(value, bytes, omitted)) {
     daemon_log(0, kStore, "Could not serialize dictionary to stream");
     return -1;
   }
@@ -93,11 +93,11 @@ PropertyValue read_value(const Descriptor& file, const char* path, std::size_t s
 }  // namespace
 
 int store_dict(const char* path, const PropertyValue& value) noexcept {
-  return store(path, value, Durability::ordinary);
+  return store(path, value, {}, Durability::ordinary);
 }
 
-int store_dict_durably(const char* path, const PropertyValue& value) noexcept {
-  return store(path, value, Durability::flushed);
+int store_dict_durably(const char* path, const PropertyValue& value, const OmittedEntries& omitted) noexcept {
+  return store(path, value, omitted, Durability::flushed);
 }
 
 PropertyValue _load_dict(const char* path, bool immutable) noexcept {

@@ -1,7 +1,7 @@
 // Property-list files, read and written whole through the safe open. Any thread may call everything here.
 #pragma once
 
-#include "platform/property/value.h"
+#include "platform/property/omitted_entries.h"
 
 namespace quorvel {
 
@@ -9,8 +9,10 @@ namespace quorvel {
 /// Returns 0, or -1 after logging why; the file may then hold part of the value.
 [[nodiscard]] int store_dict(const char* path, const PropertyValue& value) noexcept;
 
-/// `store_dict`, with the content brought to stable storage before it returns 0.
-[[nodiscard]] int store_dict_durably(const char* path, const PropertyValue& value) noexcept;
+/// `store_dict`, without the entries of `value` that are `omitted`, and with the content brought to stable storage
+/// before it returns 0.
+[[nodiscard]] int store_dict_durably(const char* path, const PropertyValue& value,
+                                     const OmittedEntries& omitted) noexcept;
 
 /// Reads the file at `path`. Returns the value, of whatever kind the file holds: with nothing in it that accepts
 /// changes when `immutable`, else with mutable containers. None after logging why.

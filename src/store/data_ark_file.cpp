@@ -30,17 +30,13 @@ bool something_is_there(const char* path) noexcept {
   return object || (errno != ENOENT && errno != ENOTDIR);
 }
 
-// The entries that a save writes; none when memory runs out. They are the values themselves where no key is left out,
-// else a copy without the keys that are, which are few.
-PropertyValue copy_saved_entries(const DataArk& ark) noexcept QUORVEL_REQUIRES(ark.lock) {
-  if (!ark.values) return PropertyValue::dictionary();
-  PropertyValue saved = ark.values;
+// Finds the entries that a save does not write. False when memory runs out.
+bool find_unsaved_entries(const DataArk& ark, OmittedEntries& unsaved) noexcept QUORVEL_REQUIRES(ark.lock) {
   for (const auto& [key, marks] : ark.class_marks.entries()) {
-    if ((static_cast<unsigned>(marks.to_int64().value_or(0)) & kUnsaved) == 0) continue;
-    const HashedKey hashed(key.text());
-    if (saved.get(hashed) && !saved.remove(hashed)) return nullptr;
+    const bool is_unsaved = (static_cast<unsigned>(marks.to_int64().value_or(0)) & kUnsaved) != 0;
+    if (is_unsaved && !unsaved.add(ark.values, key.text())) return false;
   }
-  return saved;
+  return true;
 }
 
 // Moves what could not be loaded out of the way of the file that replaces it.
@@ -72,9 +68,9 @@ void remove_data_file(const DataArk& ark, const DataArkPaths& paths) noexcept QU
   }
 }
 
-void replace_data_file(DataArk& ark, const DataArkPaths& paths, const PropertyValue& entries) noexcept
+void replace_data_file(DataArk& ark, const DataArkPaths& paths, const OmittedEntries& unsaved) noexcept
     QUORVEL_REQUIRES(ark.lock) {
-  if (store_dict_durably(paths.temporary, entries) != 0) {
+  if (store_dict_durably(paths.temporary, ark.values, unsaved) != 0) {
     daemon_log(0, "data_ark_store", "Could not store %s", paths.temporary);
     return;
   }
@@ -119,13 +115,13 @@ DataArk* data_ark_load() noexcept {
 void data_ark_store(DataArk* ark) noexcept {
   const DataArkPaths paths;
   const LockHold hold(ark->lock);
-  const PropertyValue entries = copy_saved_entries(*ark);
-  if (!entries) {
+  OmittedEntries unsaved;
+  if (!find_unsaved_entries(*ark, unsaved)) {
     daemon_log(0, "data_ark_store", "Nothing mutable changed!");
-  } else if (entries.size() == 0) {
+  } else if (ark->values.size() == unsaved.count()) {
     remove_data_file(*ark, paths);
   } else {
-    replace_data_file(*ark, paths, entries);
+    replace_data_file(*ark, paths, unsaved);
   }
   ark->change_count = 0;
 }

@@ -33,8 +33,12 @@ PropertyValue sample() {
                      {"largest", UINT64_MAX}});
 }
 
+int store_whole_durably(const char* path, const PropertyValue& value) noexcept {
+  return store_dict_durably(path, value, {});
+}
+
 TEST_F(PropertyListFile, WhatIsStoredIsLoadedEqual) {
-  for (const auto store : {store_dict, store_dict_durably}) {
+  for (const auto store : {store_dict, store_whole_durably}) {
     for (const PropertyValue& value : {sample(), array({"root"}), text("root"), dictionary({})}) {
       ASSERT_EQ(store(kFile.c_str(), value), 0);
       EXPECT_EQ(root.read_file(kFile).substr(0, 8), "bplist00");
@@ -100,7 +104,7 @@ TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
   std::signal(SIGXFSZ, SIG_IGN);
   const rlimit limit{65536, RLIM_INFINITY};
   ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &limit), 0);
-  for (const auto store : {store_dict, store_dict_durably}) {
+  for (const auto store : {store_dict, store_whole_durably}) {
     EXPECT_EQ(store(kFile.c_str(), text(std::string(100'000, 'x'))), -1);
     root.expect_log(
         {"store_dict: Could not write to " + kFile + ": Success", info(kFile, "100644"), info(kFolder, "40755")});

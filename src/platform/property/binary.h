@@ -5,6 +5,7 @@
 #include <span>
 
 #include "platform/property/byte_buffer.h"
+#include "platform/property/omitted_entries.h"
 #include "platform/property/value.h"
 
 namespace quorvel {
@@ -15,8 +16,10 @@ namespace quorvel {
 /// Any thread.
 [[nodiscard]] PropertyValue read_binary(std::span<const std::byte> bytes, Mutability mutability) noexcept;
 
-/// Appends the encoding of `value` to `out`. Equal values give equal bytes. False, and `out` as it was, when there is
-/// no value, it breaks a bound of limits.h, or memory runs out. Any thread.
-[[nodiscard]] bool write_binary(const PropertyValue& value, ByteBuffer& out) noexcept;
+/// Appends the encoding of `value`, without the entries of it that are `omitted`, to `out`. Equal values give equal
+/// bytes. False, and `out` as it was, when there is no value, it breaks a bound of limits.h, or memory runs out. Any
+/// thread.
+[[nodiscard]] bool write_binary(const PropertyValue& value, ByteBuffer& out,
+                                const OmittedEntries& omitted = {}) noexcept;
 
 }  // namespace quorvel

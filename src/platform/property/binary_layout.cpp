@@ -20,64 +20,22 @@ bool BinaryLayout::parse(std::span<const std::byte> bytes) noexcept {
   if (table <= format::kHeader.size() || table >= trailer_offset) return false;
   if (count_ == 0 || count_ > (trailer_offset - table) / offset_size_) return false;
   table_ = start_ + table;
+  unit_sizes_[Marker::kReference] = reference_size_;
+  unit_sizes_[Marker::kEntry] = 2 * reference_size_;
   return top_ < count_;
 }
 
-// The size in a marker's nibble, or in the integer object behind it.
-inline bool BinaryLayout::parse_size(EncodedObject& object) const noexcept {
-  object.size = object.nibble;
-  if (object.nibble != format::kLongSize) return true;
-  if (object.body == table_) return false;
-  const auto integer = static_cast<std::uint8_t>(*object.body++);
+// The size in an integer object of any width, which `object.body` is behind the marker of a single byte's.
+bool BinaryLayout::parse_long_size(EncodedObject& object) const noexcept {
+  const std::byte* at = object.body - 2;
+  if (at == table_) return false;
+  const auto integer = static_cast<std::uint8_t>(*at++);
   if (integer >> 4 != format::kInteger || (integer & 15) > 3) return false;
   const std::size_t width = std::size_t{1} << (integer & 15);
-  if (static_cast<std::size_t>(table_ - object.body) < width) return false;
-  object.size = format::get_integer(object.body, width);
-  object.body += width;
+  if (static_cast<std::size_t>(table_ - at) < width) return false;
+  object.size = format::get_integer(at, width);
+  object.body = at + width;
   return object.size >> 63 == 0;
-}
-
-bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object) const noexcept {
-  const std::byte* marker = marker_at(offset);
-  if (marker == nullptr) return false;
-  object.kind = static_cast<std::uint8_t>(*marker) >> 4;
-  object.nibble = static_cast<std::uint8_t>(*marker) & 15;
-  object.body = marker + 1;
-  std::size_t unit = 1;
-  switch (object.kind) {
-    case format::kFalse >> 4:
-      object.size = 0;
-      if (object.nibble != (format::kFalse & 15) && object.nibble != (format::kTrue & 15)) return false;
-      break;
-    case format::kInteger:
-      if (object.nibble > 4) return false;
-      object.size = std::uint64_t{1} << object.nibble;
-      break;
-    case format::kReal:
-      if (object.nibble != 2 && object.nibble != 3) return false;
-      object.size = std::uint64_t{1} << object.nibble;
-      break;
-    case format::kDate >> 4:
-      if (object.nibble != (format::kDate & 15)) return false;
-      object.size = 8;
-      break;
-    case format::kUtf16Text:
-    case format::kData:
-    case format::kAsciiText:
-    case format::kArray:
-    case format::kDictionary:
-      if (!parse_size(object)) return false;
-      if (object.kind == format::kUtf16Text) unit = 2;
-      if (object.kind == format::kArray) unit = reference_size_;
-      if (object.kind == format::kDictionary) unit = 2 * reference_size_;
-      break;
-    default: return false;
-  }
-  // A multiplication that would wrap is of a size that the room rules out first.
-  const auto room = static_cast<std::uint64_t>(table_ - object.body);
-  if (object.size > room || object.size * unit > room) return false;
-  object.end = object.body + object.size * unit;
-  return true;
 }
 
 bool fits_64_bits(const EncodedObject& wide_integer) noexcept {

@@ -3,15 +3,13 @@
 // stack of fixed size. Nothing is allocated for a number that the file merely claims.
 
 #include <algorithm>
-#include <bit>
 #include <cstdlib>
-#include <cstring>
 #include <memory>
 
 #include "platform/property/binary.h"
-#include "platform/property/binary_layout.h"
-#include "platform/property/leaf_allocator.h"
-#include "platform/property/unicode.h"
+#include "platform/property/block_run.h"
+#include "platform/property/dictionary_index.h"
+#include "platform/property/leaf_reader.h"
 #include "platform/property/walk.h"
 
 namespace quorvel {
@@ -21,9 +19,38 @@ using namespace detail;
 
 namespace {
 
+// What the table of objects holds is a word, and for a node what a container needs to know of it: many files are larger
+// than the processor's caches, and a node that was just made is already far away.
+constexpr Word kBlockTag = 2;  // a leaf in a block
+constexpr Word kTextTag = 4;
 // What stands for a container that is not made yet, or being made. Never retained, never handed out.
 constexpr Word kUnmade = 5;
 constexpr Word kInTheMaking = 5 | 8;
+
+bool is_immediate(Word made) noexcept { return (made & kImmediateBit) != 0; }
+bool is_text(Word made) noexcept { return (made & (kImmediateBit | kTextTag)) == kTextTag; }
+bool is_in_block(Word made) noexcept { return (made & (kImmediateBit | kBlockTag)) == kBlockTag; }
+Word plain_word(Word made) noexcept { return is_immediate(made) ? made : made & ~(kBlockTag | kTextTag); }
+Word tagged_leaf(Word word) noexcept {
+  if (!is_node(word)) return word;
+  const Node& node = *node_of(word);
+  return word | ((node.flags & kInBlock) != 0 ? kBlockTag : 0) | (node.kind == PropertyKind::string ? kTextTag : 0);
+}
+
+// Whether `left` stands before `right` in ascending order. Neighbouring keys share much of their beginning.
+bool stands_before(std::string_view left, std::string_view right) noexcept {
+  const std::size_t shared = std::min(left.size(), right.size());
+  if (shared < 8) return left < right;
+  const auto word = [](std::string_view text, std::size_t at) {
+    return format::get_integer(reinterpret_cast<const std::byte*>(text.data()) + at, 8);
+  };
+  for (std::size_t at = 0; at + 8 < shared; at += 8) {
+    const std::uint64_t a = word(left, at), b = word(right, at);
+    if (a != b) return a < b;
+  }
+  const std::uint64_t a = word(left, shared - 8), b = word(right, shared - 8);
+  return a != b ? a < b : left.size() < right.size();
+}
 
 using Object = EncodedObject;
 
@@ -38,23 +65,28 @@ class Reader {
   [[nodiscard]] PropertyValue read() noexcept;
 
  private:
+  using Run = BlockRun<TakeReferences>;
   struct Frame {
     std::size_t object;
     std::uint64_t next;  // reference to look at
   };
 
   bool make_leaves() noexcept;
-  bool make_leaf(const Object& object, Word& word) noexcept;
-  bool make_integer(const Object& object, Word& word) noexcept;
-  bool make_text(const Object& object, Word& word) noexcept;
   bool objects_overlap() const noexcept;
 
   bool make_containers() noexcept;
   bool visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept;
-  bool make_container(const Object& object, Word& word) noexcept;
-  bool make_dictionary(const Object& object, Word& word) noexcept;
-  bool take_reference(const std::byte* at, Word& word) const noexcept;
-  void count_container(Word word) noexcept { container_references_ += kind_of(word) >= PropertyKind::array ? 1 : 0; }
+  bool make_container(const Object& object, Word& made) noexcept;
+  bool make_array(const Object& object, Word& made) noexcept;
+  bool make_dictionary(const Object& object, Word& made) noexcept;
+  void fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept;
+  // What is referred to at `at`, or 0.
+  [[nodiscard]] Word made_at(const std::byte* at) const noexcept {
+    const std::uint64_t index = layout_.reference_at(at);
+    return index < layout_.count() ? made_[index] : 0;
+  }
+  // The word of an object, with a reference to it.
+  Word take(Word made, Run& run) noexcept;
   // Each container but the top one is made for its first reference: when there are more, a walk meets some again.
   [[nodiscard]] bool shares_containers() const noexcept { return container_references_ + 1 > containers_; }
 
@@ -62,27 +94,28 @@ class Reader {
   std::uint8_t container_flags_;
   BinaryLayout layout_;
   LeafAllocator leaves_;
-  Word* words_ = nullptr;
+  Word* made_ = nullptr;  // by the objects' numbers
+  std::uint64_t made_count_ = 0;
   std::uint64_t containers_ = 0;
   std::uint64_t container_references_ = 0;
 };
 
 Reader::~Reader() {
-  if (words_ == nullptr) return;
-  for (std::uint64_t i = 0; i < layout_.count(); ++i) {
-    if (is_node(words_[i]) && (node_of(words_[i])->flags & kInBlock) == 0) release(words_[i]);
+  for (std::uint64_t i = 0; i < made_count_; ++i) {
+    if (!is_immediate(made_[i]) && !is_in_block(made_[i])) release(plain_word(made_[i]));
   }
-  std::free(words_);
+  std::free(made_);
 }
 
 PropertyValue Reader::read() noexcept {
   if (!layout_.parse(bytes_)) return nullptr;
-  words_ = static_cast<Word*>(std::calloc(layout_.count(), sizeof(Word)));
-  if (words_ == nullptr) return nullptr;
+  made_ = static_cast<Word*>(std::malloc(layout_.count() * sizeof(Word)));
+  if (made_ == nullptr) return nullptr;
   leaves_.start(bytes_.size());
   if (!make_leaves() || !make_containers()) return nullptr;
-  retain(words_[layout_.top()]);
-  PropertyValue value = PropertyValue::adopt(words_[layout_.top()]);
+  const Word top = plain_word(made_[layout_.top()]);
+  retain(top);
+  PropertyValue value = PropertyValue::adopt(top);
   if (shares_containers() && !is_within_limits(value)) return nullptr;
   return value;
 }
@@ -124,81 +157,22 @@ bool Reader::make_leaves() noexcept {
       may_overlap = false;
     }
     end = layout_.end_of(object);
-    if (object.is_container()) {
-      words_[i] = kUnmade;
-    } else if (!make_leaf(object, words_[i])) {
-      return false;
-    }
+    const Word word = object.is_container() ? kUnmade : make_leaf(object, leaves_);
+    if (word == 0) return false;
+    made_[made_count_++] = tagged_leaf(word);
   }
   return true;
 }
 
-bool Reader::make_integer(const Object& object, Word& word) noexcept {
-  std::uint64_t value = 0;
-  bool is_unsigned = object.size < 8;
-  if (object.size <= 8) {
-    value = format::get_integer(object.body, object.size);
-  } else {
-    if (!fits_64_bits(object)) return false;
-    is_unsigned = *object.body == std::byte{0};
-    value = format::get_integer(object.body + 8, 8);
+inline Word Reader::take(Word made, Run& run) noexcept {
+  const Word word = plain_word(made);
+  if (is_in_block(made)) {
+    run.add(node_of(word));
+  } else if (!is_immediate(made)) {
+    container_references_ += node_of(word)->kind >= PropertyKind::array ? 1 : 0;
+    retain(word);
   }
-  if (!is_unsigned || value >> 63 == 0) {
-    const auto number = static_cast<std::int64_t>(value);
-    if (number >= kImmediateMinimum && number <= kImmediateMaximum) {
-      word = immediate_integer(number);
-      return true;
-    }
-  }
-  const bool is_large = is_unsigned && value >> 63 != 0;
-  word = leaves_.add_number(PropertyKind::integer, value, is_large ? std::uint8_t{kUnsigned} : 0);
-  return word != 0;
-}
-
-bool Reader::make_text(const Object& object, Word& word) noexcept {
-  if (object.kind == format::kUtf16Text) {
-    const std::size_t length = utf8_length_of_utf16(object.body, object.size);
-    if (length == SIZE_MAX) return false;
-    // A text that ASCII could have held is marked as what it is, so that it is written as such.
-    BytesNode* node = leaves_.add_bytes(PropertyKind::string, length, length == object.size ? std::uint8_t{kAscii} : 0);
-    if (node == nullptr) return false;
-    write_utf8(object.body, object.size, node->bytes());
-    word = word_of(node);
-    return true;
-  }
-  const std::string_view text(reinterpret_cast<const char*>(object.body), object.size);
-  const bool is_text = object.kind == format::kAsciiText;
-  if (is_text && !is_ascii(text)) return false;
-  BytesNode* node = leaves_.add_bytes(is_text ? PropertyKind::string : PropertyKind::data, text.size(),
-                                      is_text ? std::uint8_t{kAscii} : 0);
-  if (node == nullptr) return false;
-  if (!text.empty()) std::memcpy(node->bytes(), text.data(), text.size());
-  word = word_of(node);
-  return true;
-}
-
-bool Reader::make_leaf(const Object& object, Word& word) noexcept {
-  switch (object.kind) {
-    case format::kFalse >> 4: word = object.nibble == (format::kTrue & 15) ? kTrue : kFalse; return true;
-    case format::kInteger: return make_integer(object, word);
-    case format::kReal:
-    case format::kDate >> 4: {
-      std::uint64_t bits = format::get_integer(object.body, object.size);
-      if (object.size == 4) {
-        bits = std::bit_cast<std::uint64_t>(double{std::bit_cast<float>(static_cast<std::uint32_t>(bits))});
-      }
-      word = leaves_.add_number(object.kind == format::kReal ? PropertyKind::real : PropertyKind::date, bits, 0);
-      return word != 0;
-    }
-    default: return make_text(object, word);
-  }
-}
-
-bool Reader::take_reference(const std::byte* at, Word& word) const noexcept {
-  const std::uint64_t index = layout_.reference_at(at);
-  if (index >= layout_.count()) return false;
-  word = words_[index];
-  return true;
+  return word;
 }
 
 // Puts the next child that must be made first on the stack; without one, makes the container on top of it.
@@ -211,71 +185,83 @@ bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noex
   frame.next = std::max(frame.next, first);
   for (; frame.next < references; ++frame.next) {
     const std::byte* at = object.body + frame.next * layout_.reference_size();
-    Word word = 0;
-    if (!take_reference(at, word) || word == kInTheMaking) return false;
-    if (word == kUnmade) {
+    const Word made = made_at(at);
+    if (made == 0 || made == kInTheMaking) return false;
+    if (made == kUnmade) {
       if (depth == kMaximumDepth) return false;
       stack[depth++] = {static_cast<std::size_t>(layout_.reference_at(at)), 0};
-      words_[stack[depth - 1].object] = kInTheMaking;
+      made_[stack[depth - 1].object] = kInTheMaking;
       return true;
     }
   }
   --depth;
-  return make_container(object, words_[frame.object]);
+  return make_container(object, made_[frame.object]);
 }
 
 bool Reader::make_containers() noexcept {
-  if (words_[layout_.top()] != kUnmade) return true;
+  if (made_[layout_.top()] != kUnmade) return true;
   Frame stack[kMaximumDepth];
   std::size_t depth = 1;
   stack[0] = {static_cast<std::size_t>(layout_.top()), 0};
-  words_[layout_.top()] = kInTheMaking;
+  made_[layout_.top()] = kInTheMaking;
   while (depth > 0) {
     if (!visit_children(stack[depth - 1], stack, depth)) return false;
   }
   return true;
 }
 
-bool Reader::make_container(const Object& object, Word& word) noexcept {
+bool Reader::make_container(const Object& object, Word& made) noexcept {
   ++containers_;
-  if (object.kind == format::kDictionary) return make_dictionary(object, word);
+  return object.kind == format::kDictionary ? make_dictionary(object, made) : make_array(object, made);
+}
+
+bool Reader::make_array(const Object& object, Word& made) noexcept {
   ArrayNode* array = new_array(object.size, container_flags_);
   if (array == nullptr) return false;
-  word = word_of(array);
-  for (std::uint64_t i = 0; i < object.size; ++i) {
-    Word item = 0;
-    if (!take_reference(object.body + i * layout_.reference_size(), item)) return false;
-    count_container(item);
-    array->items()[i] = item;
+  made = word_of(array);
+  const std::byte* at = object.body;
+  Run run;
+  for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size()) {
+    const Word item = made_at(at);
+    if (item == 0) return false;
+    array->items()[array->used++] = take(item, run);
   }
-  retain_all(array->items(), object.size);
-  array->used = array->capacity;
   return true;
 }
 
-bool Reader::make_dictionary(const Object& object, Word& word) noexcept {
+bool Reader::make_dictionary(const Object& object, Word& made) noexcept {
+  // Keys differ, and so do their objects.
+  if (object.size > layout_.count()) return false;
   DictionaryNode* dictionary = new_dictionary(object.size, container_flags_);
   if (dictionary == nullptr) return false;
-  word = word_of(dictionary);
-  Entry* const entries = dictionary->entries();
+  made = word_of(dictionary);
+  if (!make_index(*dictionary, dictionary->capacity)) return false;
+  fill_dictionary(object, *dictionary);
+  return dictionary->used == dictionary->capacity;
+}
+
+// Takes the entries in use, all of them or those up to the first that is not sound.
+void Reader::fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept {
+  Entry* const entries = dictionary.entries();
   const std::byte* at = object.body;
   const std::byte* values = object.body + object.size * layout_.reference_size();
   std::string_view before;
-  std::uint32_t ascending = 0;
-  for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size(), values += layout_.reference_size()) {
-    Word key = 0, value = 0;
-    if (!take_reference(at, key) || !take_reference(values, value)) return false;
-    if (kind_of(key) != PropertyKind::string) return false;
-    count_container(value);
-    entries[i] = {key, value};
-    if (ascending == i && (i == 0 || before < text_of(key))) ++ascending;
-    before = text_of(key);
+  Run keys_run, values_run;
+  IndexFiller index(dictionary);
+  for (std::uint32_t& i = dictionary.used; i < dictionary.capacity; ++i) {
+    const Word key = made_at(at), value = made_at(values);
+    if (value == 0 || !is_text(key)) break;
+    // Keys in ascending order are known to differ.
+    const std::string_view text = text_of(plain_word(key));
+    const bool ascends = dictionary.ascending == i && (i == 0 || stands_before(before, text));
+    if (!index.add(text, !ascends)) break;
+    entries[i] = {take(key, keys_run), take(value, values_run)};
+    dictionary.ascending += ascends ? 1 : 0;
+    before = text;
+    at += layout_.reference_size();
+    values += layout_.reference_size();
   }
-  retain_all(&entries->key, object.size * 2);
-  dictionary->used = dictionary->live = dictionary->capacity;
-  dictionary->ascending = ascending;
-  // Keys in ascending order are known to differ.
-  return index_entries(*dictionary, ascending < dictionary->used);
+  dictionary.live = dictionary.used;
 }
 
 }  // namespace

@@ -2,13 +2,13 @@
 // A removed entry leaves a gap in the row until the row is next moved.
 
 #include <algorithm>
-#include <bit>
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
 #include <limits>
 #include <new>
 
+#include "platform/property/dictionary_index.h"
 #include "platform/property/unicode.h"
 #include "platform/property/value.h"
 
@@ -17,20 +17,12 @@ namespace detail {
 
 namespace {
 
-// Up to this many entries are found by scanning.
-constexpr std::uint32_t kUnindexed = 8;
 constexpr std::size_t kMaximumEntries = std::size_t{1} << 31;
 
 std::uint64_t make_seed() noexcept {
   const auto now = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
   int local = 0;
   return mix(now ^ reinterpret_cast<std::uintptr_t>(&local), reinterpret_cast<std::uintptr_t>(&make_seed) | 1);
-}
-
-void place(IndexSlot* index, std::uint32_t mask, IndexSlot slot) noexcept {
-  std::uint32_t at = slot.hash & mask;
-  while (index[at].entry != 0) at = (at + 1) & mask;
-  index[at] = slot;
 }
 
 // Gives the dictionary an index of `size` slots; the old one stays when memory runs out.
@@ -175,36 +167,15 @@ bool grow_storage(ContainerNode& container, std::size_t slot_size) noexcept {
 bool prepare_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept {
   if (entries <= kUnindexed && dictionary.index_size == 0) return true;
   if (std::uint64_t{entries} * 4 <= std::uint64_t{dictionary.index_size} * 3) return true;
-  return rebuild_index(dictionary, std::bit_ceil(entries + entries / 3 + 1));
+  return rebuild_index(dictionary, index_size_for(entries));
 }
 
-bool index_entries(DictionaryNode& dictionary, bool check) noexcept {
-  const Entry* const entries = dictionary.entries();
-  if (dictionary.used <= kUnindexed) {
-    for (std::uint32_t i = 0; check && i < dictionary.used; ++i) {
-      for (std::uint32_t j = 0; j < i; ++j) {
-        if (text_of(entries[i].key) == text_of(entries[j].key)) return false;
-      }
-    }
-    return true;
-  }
-  dictionary.index_size = std::bit_ceil(dictionary.used + dictionary.used / 3 + 1);
-  dictionary.index = static_cast<IndexSlot*>(std::calloc(dictionary.index_size, sizeof(IndexSlot)));
-  if (dictionary.index == nullptr) {
-    dictionary.index_size = 0;
-    return false;
-  }
-  const std::uint32_t mask = dictionary.index_size - 1;
-  for (std::uint32_t i = 0; i < dictionary.used; ++i) {
-    const std::string_view key = text_of(entries[i].key);
-    const std::uint32_t hash = hash_text(key);
-    std::uint32_t at = hash & mask;
-    for (; dictionary.index[at].entry != 0; at = (at + 1) & mask) {
-      const IndexSlot slot = dictionary.index[at];
-      if (check && slot.hash == hash && text_of(entries[slot.entry - 1].key) == key) return false;
-    }
-    dictionary.index[at] = {hash, i + 1};
-  }
+bool make_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept {
+  if (entries <= kUnindexed) return true;
+  const std::uint32_t size = index_size_for(entries);
+  dictionary.index = static_cast<IndexSlot*>(std::calloc(size, sizeof(IndexSlot)));
+  if (dictionary.index == nullptr) return false;
+  dictionary.index_size = size;
   return true;
 }
 

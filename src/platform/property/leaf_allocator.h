@@ -5,6 +5,8 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <new>
+#include <utility>
 
 #include "platform/property/node.h"
 
@@ -26,14 +28,27 @@ class LeafAllocator {
 
   /// A leaf whose bytes the caller fills in, or null. A leaf of its own memory comes with one reference; a leaf in a
   /// block with none: it lives at least as long as this allocator.
-  [[nodiscard]] BytesNode* add_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept;
+  [[nodiscard]] BytesNode* add_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
+    if (length > kLargestShared) return add_large(kind, length, flags);
+    void* memory = take(BytesNode::allocation(length));
+    if (memory == nullptr) return nullptr;
+    return new (memory) BytesNode{{distance(memory), kind, static_cast<std::uint8_t>(flags | kInBlock), 0},
+                                  static_cast<std::uint32_t>(length)};
+  }
   /// 0 when memory runs out.
   [[nodiscard]] Word add_number(PropertyKind kind, std::uint64_t bits, std::uint8_t flags) noexcept;
 
  private:
-  [[nodiscard]] void* take(std::size_t size) noexcept;
-  [[nodiscard]] bool add_block() noexcept;
-  [[nodiscard]] std::uint32_t distance(const void* node) const noexcept;
+  [[nodiscard]] static BytesNode* add_large(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept;
+  [[nodiscard]] void* take(std::size_t size) noexcept {
+    size = (size + 7) & ~std::size_t{7};
+    if (static_cast<std::size_t>(end_ - at_) < size && !add_block(size)) return nullptr;
+    return std::exchange(at_, at_ + size);
+  }
+  [[nodiscard]] bool add_block(std::size_t size) noexcept;
+  [[nodiscard]] std::uint32_t distance(const void* node) const noexcept {
+    return static_cast<std::uint32_t>((static_cast<const char*>(node) - reinterpret_cast<const char*>(newest_)) / 8);
+  }
 
   Block* newest_ = nullptr;
   char* at_ = nullptr;

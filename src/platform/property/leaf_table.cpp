@@ -33,12 +33,12 @@ bool same_leaf(Word left, Word right) noexcept {
 }  // namespace
 
 bool LeafTable::resize(std::size_t size) noexcept {
-  auto* slots = static_cast<IndexSlot*>(std::calloc(size, sizeof(IndexSlot)));
+  auto* slots = static_cast<Slot*>(std::calloc(size, sizeof(Slot)));
   if (slots == nullptr) return false;
   for (std::size_t i = 0; i < size_; ++i) {
-    if (slots_[i].entry == 0) continue;
+    if (slots_[i].leaf == 0) continue;
     std::size_t at = slots_[i].hash & (size - 1);
-    while (slots[at].entry != 0) at = (at + 1) & (size - 1);
+    while (slots[at].leaf != 0) at = (at + 1) & (size - 1);
     slots[at] = slots_[i];
   }
   std::free(slots_);
@@ -47,17 +47,17 @@ bool LeafTable::resize(std::size_t size) noexcept {
   return true;
 }
 
-LeafTable::Outcome LeafTable::find_or_add(Word leaf, const Word* objects, std::uint32_t& number) noexcept {
+LeafTable::Outcome LeafTable::find_or_add(Word leaf, std::uint32_t& number) noexcept {
   if (used_ * 2 >= size_ && !resize(std::max<std::size_t>(64, size_ * 2))) return Outcome::no_memory;
   const std::uint32_t hash = hash_leaf(leaf);
   std::size_t at = hash & (size_ - 1);
-  for (; slots_[at].entry != 0; at = (at + 1) & (size_ - 1)) {
-    if (slots_[at].hash == hash && same_leaf(objects[slots_[at].entry - 1], leaf)) {
-      number = slots_[at].entry - 1;
+  for (; slots_[at].leaf != 0; at = (at + 1) & (size_ - 1)) {
+    if (slots_[at].hash == hash && same_leaf(slots_[at].leaf, leaf)) {
+      number = slots_[at].number;
       return Outcome::found;
     }
   }
-  slots_[at] = {hash, number + 1};
+  slots_[at] = {leaf, hash, number};
   ++used_;
   return Outcome::added;
 }

@@ -19,13 +19,19 @@ class LeafTable {
   ~LeafTable() { std::free(slots_); }
 
   /// Looks up a leaf equal to `leaf` and sets `number` to its number; when there is none, takes `leaf` in under
-  /// `number`. `objects` are the numbered leaves.
-  [[nodiscard]] Outcome find_or_add(Word leaf, const Word* objects, std::uint32_t& number) noexcept;
+  /// `number`. The table refers to the leaves that it took in.
+  [[nodiscard]] Outcome find_or_add(Word leaf, std::uint32_t& number) noexcept;
 
  private:
+  struct Slot {
+    Word leaf;  // 0 in a free slot
+    std::uint32_t hash;
+    std::uint32_t number;
+  };
+
   [[nodiscard]] bool resize(std::size_t size) noexcept;
 
-  IndexSlot* slots_ = nullptr;
+  Slot* slots_ = nullptr;
   std::size_t size_ = 0;
   std::size_t used_ = 0;
 };

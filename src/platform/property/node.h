@@ -64,6 +64,10 @@ struct BytesNode : Node {
   [[nodiscard]] char* bytes() noexcept { return reinterpret_cast<char*>(this) + kBytesOffset; }
   [[nodiscard]] std::string_view view() const noexcept { return {bytes(), length}; }
   static constexpr std::size_t kBytesOffset = 12;
+  /// The memory for so many bytes. The first eight can always be read, so that a short text needs no copy byte by byte.
+  [[nodiscard]] static constexpr std::size_t allocation(std::size_t length) noexcept {
+    return kBytesOffset + (length < 12 ? 12 : length);
+  }
 };
 static_assert(sizeof(BytesNode) == BytesNode::kBytesOffset);
 
@@ -78,7 +82,8 @@ struct NumberNode : Node {
 // The head of a block of leaves that share one count.
 struct Block {
   std::atomic<std::uint64_t> count;
-  Block* previous;  // of the same reader, while it reads
+  Block* previous;   // of the same reader, while it reads
+  std::size_t size;  // in bytes, the head included
 };
 
 struct ContainerNode : Node {
@@ -186,9 +191,6 @@ void retain_all(const Word* words, std::size_t count) noexcept;
 [[nodiscard]] bool grow_storage(ContainerNode& container, std::size_t slot_size) noexcept;
 /// Makes the index large enough for `entries` entries. False, and nothing changed, when memory runs out.
 [[nodiscard]] bool prepare_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept;
-/// Gives a dictionary that was filled without one its index. False when memory runs out, or when `check` finds a key
-/// that stands there twice.
-[[nodiscard]] bool index_entries(DictionaryNode& dictionary, bool check) noexcept;
 /// The entry under `key`, or null.
 [[nodiscard]] Entry* find_entry(const DictionaryNode& dictionary, const HashedKey& key) noexcept;
 /// Adds an entry under a key that is not there yet, taking over both references. There must be room for it.

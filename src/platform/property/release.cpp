@@ -3,42 +3,11 @@
 
 #include <cstdlib>
 
-#include "platform/property/node.h"
+#include "platform/property/block_run.h"
 
 namespace quorvel::detail {
 
 namespace {
-
-// Gathers references to leaves of one block, to take or drop them in one step.
-template <class Settle>
-class BlockRun {
- public:
-  ~BlockRun() { settle(); }
-  void add(Block* block) noexcept {
-    if (block != block_) {
-      settle();
-      block_ = block;
-    }
-    ++references_;
-  }
-
- private:
-  void settle() noexcept {
-    if (block_ != nullptr) Settle{}(block_, references_);
-    references_ = 0;
-  }
-  Block* block_ = nullptr;
-  std::uint64_t references_ = 0;
-};
-
-struct Drop {
-  void operator()(Block* block, std::uint64_t references) const noexcept { release_block(block, references); }
-};
-struct Take {
-  void operator()(Block* block, std::uint64_t references) const noexcept {
-    block->count.fetch_add(references, std::memory_order_relaxed);
-  }
-};
 
 ContainerNode*& next_of(ContainerNode* container) noexcept {
   if (container->kind == PropertyKind::array) return static_cast<ArrayNode*>(container)->next;
@@ -63,12 +32,12 @@ void condemn(ContainerNode* container, ContainerNode*& condemned) noexcept {
 }
 
 void drop_words(const Word* words, std::size_t count, ContainerNode*& condemned) noexcept {
-  BlockRun<Drop> run;
+  BlockRun<DropReferences> run;
   for (std::size_t i = 0; i < count; ++i) {
     if (!is_node(words[i])) continue;
     Node* node = node_of(words[i]);
     if ((node->flags & kInBlock) != 0) {
-      run.add(block_of(node));
+      run.add(node);
     } else if ((node->flags & kStatic) == 0 && node->count.fetch_sub(1, std::memory_order_acq_rel) == 1) {
       if (node->kind >= PropertyKind::array) {
         condemn(static_cast<ContainerNode*>(node), condemned);
@@ -107,12 +76,12 @@ void release_block(Block* block, std::uint64_t references) noexcept {
 }
 
 void retain_all(const Word* words, std::size_t count) noexcept {
-  BlockRun<Take> run;
+  BlockRun<TakeReferences> run;
   for (std::size_t i = 0; i < count; ++i) {
     if (!is_node(words[i])) continue;
     Node* node = node_of(words[i]);
     if ((node->flags & kInBlock) != 0) {
-      run.add(block_of(node));
+      run.add(node);
     } else if ((node->flags & kStatic) == 0) {
       node->count.fetch_add(1, std::memory_order_relaxed);
     }

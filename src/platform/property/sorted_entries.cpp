@@ -98,8 +98,13 @@ class Sorter {
 
 }  // namespace
 
-SortedEntries::SortedEntries(const DictionaryNode& dictionary) noexcept : entries_(dictionary.entries()), valid_(true) {
-  if (dictionary.ascending == dictionary.used && dictionary.live == dictionary.used) return;
+SortedEntries::SortedEntries(const DictionaryNode& dictionary, const OmittedEntries* omitted) noexcept
+    : entries_(dictionary.entries()), size_(dictionary.live) {
+  if (dictionary.ascending < dictionary.used || dictionary.live < dictionary.used) find_order(dictionary);
+  if (valid_ && omitted != nullptr && omitted->count() > 0) leave_out(*omitted);
+}
+
+void SortedEntries::find_order(const DictionaryNode& dictionary) noexcept {
   std::uint32_t* order = dictionary.order.load(std::memory_order_acquire);
   if (order == nullptr) {
     Row<std::uint32_t> sorted = Sorter(dictionary).sort();
@@ -109,6 +114,19 @@ SortedEntries::SortedEntries(const DictionaryNode& dictionary) noexcept : entrie
     }
   }
   order_ = order;
+}
+
+void SortedEntries::leave_out(const OmittedEntries& omitted) noexcept {
+  own_ = make_row<std::uint32_t>(size_).release();
+  valid_ = own_ != nullptr;
+  if (!valid_) return;
+  std::uint32_t* end = own_;
+  for (std::uint32_t i = 0; i < size_; ++i) {
+    *end = order_ == nullptr ? i : order_[i];
+    end += omitted.contains(*end) ? 0 : 1;
+  }
+  size_ = static_cast<std::size_t>(end - own_);
+  order_ = own_;
 }
 
 }  // namespace quorvel::detail

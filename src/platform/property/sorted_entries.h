@@ -3,26 +3,37 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <cstdlib>
 
 #include "platform/property/node.h"
+#include "platform/property/omitted_entries.h"
 
 namespace quorvel::detail {
 
 class SortedEntries {
  public:
   /// Tests false when memory runs out. The dictionary, which keeps the order it was found to have, may not change or
-  /// end meanwhile. Any thread.
-  explicit SortedEntries(const DictionaryNode& dictionary) noexcept;
+  /// end meanwhile. Of `omitted` entries, where they are given, there are none. Any thread.
+  explicit SortedEntries(const DictionaryNode& dictionary, const OmittedEntries* omitted = nullptr) noexcept;
+  SortedEntries(const SortedEntries&) = delete;
+  SortedEntries& operator=(const SortedEntries&) = delete;
+  ~SortedEntries() { std::free(own_); }
 
   [[nodiscard]] explicit operator bool() const noexcept { return valid_; }
+  [[nodiscard]] std::size_t size() const noexcept { return size_; }
   [[nodiscard]] const Entry& operator[](std::size_t index) const noexcept {
     return order_ == nullptr ? entries_[index] : entries_[order_[index]];
   }
 
  private:
+  void find_order(const DictionaryNode& dictionary) noexcept;
+  void leave_out(const OmittedEntries& omitted) noexcept;
+
   const Entry* entries_;
   const std::uint32_t* order_ = nullptr;  // null where the entries stand in order and without gaps
-  bool valid_;
+  std::uint32_t* own_ = nullptr;          // the order where it is not the dictionary's
+  std::size_t size_;
+  bool valid_ = true;
 };
 
 }  // namespace quorvel::detail

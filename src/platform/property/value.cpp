@@ -26,7 +26,7 @@ NumberNode* new_number(PropertyKind kind, std::uint64_t bits, std::uint8_t flags
 
 BytesNode* new_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
   if (length > std::numeric_limits<std::uint32_t>::max()) return nullptr;
-  void* memory = std::malloc(BytesNode::kBytesOffset + length);
+  void* memory = std::malloc(BytesNode::allocation(length));
   if (memory == nullptr) return nullptr;
   return new (memory) BytesNode{{1, kind, flags, 0}, static_cast<std::uint32_t>(length)};
 }

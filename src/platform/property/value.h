@@ -189,7 +189,7 @@ class alignas(8) StaticText : detail::BytesNode {
   [[nodiscard]] constexpr const char* c_str() const noexcept { return text_; }
 
  private:
-  char text_[Size] = {};
+  char text_[Size < 12 ? 12 : Size] = {};
 };
 
 }  // namespace quorvel

@@ -129,6 +129,27 @@ TEST(Binary, EqualValuesGiveEqualBytes) {
   EXPECT_EQ(encoded(decoded(encoded(up))), encoded(up));
 }
 
+TEST(Binary, ReferencesAreAsSmallAsTheyCanBe) {
+  const auto flags = [](int entries) {
+    PropertyValue value = PropertyValue::dictionary();
+    for (int i = 0; i < entries; ++i) EXPECT_TRUE(value.set(std::to_string(i), PropertyValue::boolean(true)));
+    return value;
+  };
+  const auto numbers = [](int count) {
+    PropertyValue value = PropertyValue::array();
+    for (int i = 0; i < count; ++i) EXPECT_TRUE(value.append(PropertyValue::integer(i)));
+    return array({value});
+  };
+  const std::tuple<PropertyValue, int> cases[] = {{flags(254), 1},      {flags(255), 2},     {flags(40'000), 2},
+                                                  {flags(65'535), 4},   {numbers(254), 1},   {numbers(255), 2},
+                                                  {numbers(65'534), 2}, {numbers(65'535), 4}};
+  for (const auto& [value, size] : cases) {
+    const std::string file = encoded(value);
+    EXPECT_EQ(file[file.size() - 25], size);
+    EXPECT_EQ(decoded(file), value);
+  }
+}
+
 PropertyValue nested(std::size_t levels) {
   PropertyValue value = PropertyValue::boolean(true);
   for (std::size_t i = 0; i < levels; ++i) value = array({value});

@@ -1,0 +1,70 @@
+// The index of a dictionary with more than a handful of entries: a table with linear probing, at most three quarters
+// full, of which every slot leads to an entry.
+#pragma once
+
+#include <bit>
+#include <cstdint>
+
+#include "platform/property/node.h"
+
+namespace quorvel::detail {
+
+/// Up to this many entries are found by scanning, without an index.
+inline constexpr std::uint32_t kUnindexed = 8;
+
+/// The slots that so many entries need.
+[[nodiscard]] inline std::uint32_t index_size_for(std::uint32_t entries) noexcept {
+  return std::bit_ceil(entries + entries / 3 + 1);
+}
+
+/// Puts an entry that is not there yet into an index with room for it.
+inline void place(IndexSlot* index, std::uint32_t mask, IndexSlot slot) noexcept {
+  std::uint32_t at = slot.hash & mask;
+  while (index[at].entry != 0) at = (at + 1) & mask;
+  index[at] = slot;
+}
+
+/// Makes the index of an empty dictionary that is about to get so many entries. False when memory runs out.
+[[nodiscard]] bool make_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept;
+
+/// Puts the entries of a dictionary that is being filled into the index that `make_index` made, in their order. The
+/// slots of a large index are far away: each is fetched while others are filled.
+class IndexFiller {
+ public:
+  explicit IndexFiller(DictionaryNode& dictionary) noexcept : dictionary_(dictionary) {}
+  IndexFiller(const IndexFiller&) = delete;
+  IndexFiller& operator=(const IndexFiller&) = delete;
+  ~IndexFiller() { place_all(); }
+
+  /// Adds the entry behind those that are in use, whose key is `key`. With `check`, false when one of those has it,
+  /// too.
+  [[nodiscard]] bool add(const HashedKey& key, bool check) noexcept {
+    if (check) {
+      place_all();
+      if (find_entry(dictionary_, key) != nullptr) return false;
+    }
+    if (dictionary_.index_size == 0) return true;
+    if (added_ - placed_ == kUnderWay) place_next();
+    hashes_[added_++ % kUnderWay] = key.hash;
+    __builtin_prefetch(&dictionary_.index[key.hash & (dictionary_.index_size - 1)]);
+    return true;
+  }
+
+ private:
+  static constexpr std::uint32_t kUnderWay = 16;
+
+  void place_next() noexcept {
+    const std::uint32_t hash = hashes_[placed_++ % kUnderWay];
+    place(dictionary_.index, dictionary_.index_size - 1, {hash, placed_});
+  }
+  void place_all() noexcept {
+    while (placed_ < added_) place_next();
+  }
+
+  DictionaryNode& dictionary_;
+  std::uint32_t added_ = 0;
+  std::uint32_t placed_ = 0;
+  std::uint32_t hashes_[kUnderWay];
+};
+
+}  // namespace quorvel::detail
