@@ -10,6 +10,7 @@
 
 #include "platform/property/binary_layout.h"
 #include "platform/property/limits.h"
+#include "platform/property/short_text.h"
 #include "platform/property/unicode.h"
 
 namespace quorvel::detail {
@@ -22,9 +23,21 @@ std::string_view text_of(const EncodedObject& object) noexcept {
   return {reinterpret_cast<const char*>(object.body), object.size};
 }
 
+// Eight bytes can always be read, as a file does not end with an object.
+bool is_ascii_text(const EncodedObject& object) noexcept {
+  if (object.size > kShortText) return is_ascii(text_of(object));
+  std::uint64_t all = 0;
+  visit_words(object.size, [&](std::size_t offset) {
+    std::uint64_t word;
+    std::memcpy(&word, object.body + offset, sizeof word);
+    all |= word;
+  });
+  return !has_high_bits(all, object.size);
+}
+
 bool is_valid_leaf(const EncodedObject& object) noexcept {
   switch (object.kind) {
-    case format::kAsciiText: return is_ascii(text_of(object));
+    case format::kAsciiText: return is_ascii_text(object);
     case format::kUtf16Text: return utf8_length_of_utf16(object.body, object.size) != SIZE_MAX;
     case format::kInteger: return object.size < 16 || fits_64_bits(object);
     default: return true;
@@ -73,7 +86,7 @@ class Checker {
       const std::uint64_t reference = layout_.reference_at(at);
       EncodedObject key;
       if (reference >= layout_.count() || !layout_.object_at(layout_.offset_of(reference), key)) return false;
-      if (key.kind != format::kAsciiText || (i > 0 && before >= text_of(key))) return false;
+      if (key.kind != format::kAsciiText || (i > 0 && !stands_before(before, text_of(key)))) return false;
       before = text_of(key);
     }
     return true;

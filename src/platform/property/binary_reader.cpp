@@ -10,6 +10,7 @@
 #include "platform/property/block_run.h"
 #include "platform/property/dictionary_index.h"
 #include "platform/property/leaf_reader.h"
+#include "platform/property/short_text.h"
 #include "platform/property/walk.h"
 
 namespace quorvel {
@@ -35,21 +36,6 @@ Word tagged_leaf(Word word) noexcept {
   if (!is_node(word)) return word;
   const Node& node = *node_of(word);
   return word | ((node.flags & kInBlock) != 0 ? kBlockTag : 0) | (node.kind == PropertyKind::string ? kTextTag : 0);
-}
-
-// Whether `left` stands before `right` in ascending order. Neighbouring keys share much of their beginning.
-bool stands_before(std::string_view left, std::string_view right) noexcept {
-  const std::size_t shared = std::min(left.size(), right.size());
-  if (shared < 8) return left < right;
-  const auto word = [](std::string_view text, std::size_t at) {
-    return format::get_integer(reinterpret_cast<const std::byte*>(text.data()) + at, 8);
-  };
-  for (std::size_t at = 0; at + 8 < shared; at += 8) {
-    const std::uint64_t a = word(left, at), b = word(right, at);
-    if (a != b) return a < b;
-  }
-  const std::uint64_t a = word(left, shared - 8), b = word(right, shared - 8);
-  return a != b ? a < b : left.size() < right.size();
 }
 
 using Object = EncodedObject;

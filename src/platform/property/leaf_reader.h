@@ -7,35 +7,27 @@
 
 #include "platform/property/binary_layout.h"
 #include "platform/property/leaf_allocator.h"
+#include "platform/property/short_text.h"
 #include "platform/property/unicode.h"
 
 namespace quorvel::detail {
 
-/// Copies the bytes of a text or data value into its node; returns false when one of them is above 0x7f. Lengths vary,
-/// so that a branch on one is mispredicted: short texts are copied without any, eight bytes at a time, overlapping.
-/// Eight bytes can always be read, as a file does not end with an object, and be written, as they fit the smallest
-/// node.
+/// Copies the bytes of a text or data value into its node; returns false when one of them is above 0x7f. Eight bytes
+/// can always be read, as a file does not end with an object, and be written, as they fit the smallest node.
 inline bool copy_bytes(BytesNode& node, const std::byte* from, std::size_t length) noexcept {
   char* const to = node.bytes();
-  if (length > 40) {
+  if (length > kShortText) {
     std::memcpy(to, from, length);
     return is_ascii({to, length});
   }
-  const auto copy_word = [=](std::size_t offset) {
+  std::uint64_t all = 0;
+  visit_words(length, [&](std::size_t offset) {
     std::uint64_t word;
     std::memcpy(&word, from + offset, sizeof word);
     std::memcpy(to + offset, &word, sizeof word);
-    return word;
-  };
-  const std::size_t last = length < 8 ? 0 : length - 8;
-  const std::uint64_t all = copy_word(0) | copy_word(std::min<std::size_t>(last, 8)) |
-                            copy_word(std::min<std::size_t>(last, 16)) | copy_word(std::min<std::size_t>(last, 24)) |
-                            copy_word(last);
-  // Of fewer than eight bytes only those that are the text's count.
-  static constexpr unsigned char kHighBits[16] = {0x80, 0x80, 0x80, 0x80, 0x80, 0x80, 0x80, 0x80};
-  std::uint64_t mask;
-  std::memcpy(&mask, kHighBits + 8 - std::min<std::size_t>(length, 8), sizeof mask);
-  return (all & mask) == 0;
+    all |= word;
+  });
+  return !has_high_bits(all, length);
 }
 
 /// A text in ASCII, or data. 0 when a text is none, or memory runs out.

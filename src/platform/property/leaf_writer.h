@@ -2,13 +2,13 @@
 // `leaf_room` bytes, and returns where it ended.
 #pragma once
 
-#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
 
 #include "platform/property/binary_format.h"
 #include "platform/property/node.h"
+#include "platform/property/short_text.h"
 #include "platform/property/unicode.h"
 
 namespace quorvel::detail {
@@ -27,20 +27,13 @@ inline constexpr std::size_t kLeafRoom = 64;
   return is_node(word) && holds_bytes(word) ? kLeafRoom + std::size_t{bytes_of(word)->length} * 2 : kLeafRoom;
 }
 
-// Lengths vary from leaf to leaf, so that a branch on one is mispredicted: what is common is written without any, eight
-// bytes at a time, overlapping, and what is written too much is overwritten by what comes next.
+// What is written without a branch may reach beyond the leaf: it is overwritten by what comes next.
 
 inline std::byte* put_bytes(std::byte* at, const BytesNode& node) noexcept {
   const char* from = node.bytes();
   const std::size_t length = node.length;
-  if (length <= 40) {
-    const std::size_t last = length < 8 ? 0 : length - 8;
-    const auto copy_word = [=](std::size_t offset) { std::memcpy(at + offset, from + offset, 8); };
-    copy_word(0);
-    copy_word(std::min<std::size_t>(last, 8));
-    copy_word(std::min<std::size_t>(last, 16));
-    copy_word(std::min<std::size_t>(last, 24));
-    copy_word(last);
+  if (length <= kShortText) {
+    visit_words(length, [=](std::size_t offset) { std::memcpy(at + offset, from + offset, 8); });
   } else if (length <= 64) {
     std::memcpy(at, from, 32);
     std::memcpy(at + length - 32, from + length - 32, 32);
