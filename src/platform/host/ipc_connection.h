@@ -30,6 +30,7 @@ class IpcConnection : public host::ListLink {
  public:
   /// What the worker waits for; each stage has a list of its own, in the order of `since`.
   enum class Stage : std::uint8_t {
+    fresh,    // the first byte of its first call
     idle,     // the first byte of a call
     partial,  // the rest of a call
     ready,    // its turn: a whole call is there
@@ -58,7 +59,7 @@ class IpcConnection : public host::ListLink {
   [[nodiscard]] bool is_broken() const noexcept { return broken_; }
 
   /// The worker's notes.
-  Stage stage = Stage::idle;
+  Stage stage = Stage::fresh;
   bool input_ended = false;
   std::uint32_t interest = 0;
   std::int64_t since = 0;

@@ -76,7 +76,7 @@ void IpcWorker::run() noexcept {
 
 void IpcWorker::handle(const epoll_event& event) noexcept {
   if (event.data.ptr == listener_) {
-    accept_one();
+    accept_some();
   } else if (event.data.ptr == &wake_) {
     eventfd_t count;
     ::eventfd_read(wake_.get(), &count);
@@ -102,6 +102,7 @@ int IpcWorker::wait_limit() const noexcept {
 
 void IpcWorker::serve(IpcConnection& connection) noexcept {
   switch (connection.stage) {
+    case Stage::fresh:
     case Stage::idle:
     case Stage::partial: return receive(connection);
     case Stage::sending:
@@ -170,7 +171,7 @@ void IpcWorker::settle(IpcConnection& connection) noexcept {
   }
   if (connection.input_ended) return close(connection);
   if (!has_input) {
-    if (connection.stage != Stage::idle) move_to(connection, Stage::idle);
+    if (connection.stage > Stage::idle) move_to(connection, Stage::idle);
   } else if (connection.stage != Stage::partial) {
     move_to(connection, Stage::partial);
   }
@@ -204,7 +205,8 @@ void IpcWorker::set_interest(IpcConnection& connection, std::uint32_t events) no
   epoll_event event = {};
   event.events = events;
   event.data.ptr = &connection;
-  if (::epoll_ctl(epoll_.get(), EPOLL_CTL_MOD, connection.descriptor(), &event) != 0) return close(connection);
+  const int operation = connection.interest == 0 ? EPOLL_CTL_ADD : EPOLL_CTL_MOD;
+  if (::epoll_ctl(epoll_.get(), operation, connection.descriptor(), &event) != 0) return close(connection);
   connection.interest = events;
 }
 

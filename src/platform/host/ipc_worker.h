@@ -70,7 +70,8 @@ class IpcWorker {
   // Accepting: ipc_worker_accept.cpp.
   void listen() noexcept;
   void rest() noexcept;
-  void accept_one() noexcept;
+  void accept_some() noexcept;
+  [[nodiscard]] bool accept_one() noexcept;
   [[nodiscard]] bool introduce(Descriptor socket) noexcept;
   [[nodiscard]] IpcConnection* longest_idle() const noexcept;
   void hand_over(IpcConnection& connection) noexcept;

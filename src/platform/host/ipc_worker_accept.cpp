@@ -3,6 +3,7 @@
 
 #include <cerrno>
 #include <new>
+#include <utility>
 
 #include "platform/host/connection_limit.h"
 #include "platform/host/ipc_listener.h"
@@ -13,8 +14,11 @@ namespace quorvel::platform::host {
 
 namespace {
 
-// A connection that was quiet for this long may have to make room for a new one.
+// A connection that was quiet for this long may have to make room for a new one; one that never made a call, sooner.
 constexpr std::int64_t kEvictableMilliseconds = 1000;
+constexpr std::int64_t kUnusedMilliseconds = 100;
+
+constexpr int kAcceptsAtOnce = 16;
 
 }  // namespace
 
@@ -37,16 +41,25 @@ void IpcWorker::rest() noexcept {
   listen_again_ = now_ + kAcceptRestMilliseconds;
 }
 
-void IpcWorker::accept_one() noexcept {
+// Who connects only to leave again is often not alone: the next one is looked for without waiting for an event.
+void IpcWorker::accept_some() noexcept {
+  for (int i = 0; i < kAcceptsAtOnce && accept_one(); ++i) continue;
+}
+
+// Returns whether somebody came and is gone already.
+bool IpcWorker::accept_one() noexcept {
   IpcConnection* evicted = nullptr;
   if (listener_->connection_count() >= client_connection_limit()) {
     evicted = longest_idle();
-    if (evicted == nullptr) return rest();
+    if (evicted == nullptr) {
+      rest();
+      return false;
+    }
   }
   Descriptor socket(::accept4(listener_->descriptor(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
   if (socket) {
     if (evicted != nullptr) close(*evicted);
-    if (!introduce(std::move(socket))) rest();
+    return introduce(std::move(socket));
   } else if (is_exhaustion(errno)) {
     evicted = longest_idle();
     rest();
@@ -54,12 +67,16 @@ void IpcWorker::accept_one() noexcept {
   } else if (errno != EAGAIN && errno != EINTR && errno != ECONNABORTED) {
     rest();
   }
+  return false;
 }
 
-// False when memory runs out.
+// Returns whether the client is gone already.
 bool IpcWorker::introduce(Descriptor socket) noexcept {
   auto* connection = new (std::nothrow) IpcConnection(std::move(socket));
-  if (connection == nullptr) return false;
+  if (connection == nullptr) {
+    rest();
+    return false;
+  }
   if (!listener_->accepts(*connection)) {
     delete connection;
     return true;
@@ -68,17 +85,25 @@ bool IpcWorker::introduce(Descriptor socket) noexcept {
   // The kernel wakes the same thread again and again while that has time to accept, so the balance is struck here.
   if (connection_count() > least_loaded.connection_count()) {
     least_loaded.hand_over(*connection);
-  } else {
-    count_.fetch_add(1, std::memory_order_relaxed);
-    take_in(*connection);
+    return false;
   }
-  return true;
+  count_.fetch_add(1, std::memory_order_relaxed);
+  move_to(*connection, Stage::fresh);
+  // Who sends a call and leaves, or sends what is none, costs no more than that.
+  receive(*connection);
+  if (connection->interest == 0 && connection->stage != Stage::closed) set_interest(*connection, EPOLLIN);
+  return connection->stage == Stage::closed;
 }
 
-// The least recently used connection that nothing is in flight on, or null when none has been quiet long enough.
+// The least recently used connection that nothing is in flight on, one without a call first, or null when none has been
+// quiet long enough.
 IpcConnection* IpcWorker::longest_idle() const noexcept {
-  IpcConnection* first = list_of(Stage::idle).front();
-  return first != nullptr && first->since + kEvictableMilliseconds <= now_ ? first : nullptr;
+  for (const auto& [stage, limit] :
+       {std::pair(Stage::fresh, kUnusedMilliseconds), std::pair(Stage::idle, kEvictableMilliseconds)}) {
+    IpcConnection* first = list_of(stage).front();
+    if (first != nullptr && first->since + limit <= now_) return first;
+  }
+  return nullptr;
 }
 
 // Called by the worker that accepted the connection.
@@ -92,12 +117,8 @@ void IpcWorker::hand_over(IpcConnection& connection) noexcept {
 }
 
 void IpcWorker::take_in(IpcConnection& connection) noexcept {
-  epoll_event event = {};
-  event.events = EPOLLIN;
-  event.data.ptr = &connection;
-  connection.interest = EPOLLIN;
-  move_to(connection, Stage::idle);
-  if (::epoll_ctl(epoll_.get(), EPOLL_CTL_ADD, connection.descriptor(), &event) != 0) close(connection);
+  move_to(connection, connection.stage);
+  set_interest(connection, EPOLLIN);
 }
 
 void IpcWorker::take_in_handed_over() noexcept {
