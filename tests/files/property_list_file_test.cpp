@@ -114,6 +114,7 @@ TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
 
 TEST(MakeMutable, EndsTheProcessForEveryOtherKind) {
   ScratchRoot root;
+  EXPECT_TRUE(make_mutable(data("x")).is_mutable());
   for (const PropertyValue& value : {text("a"), PropertyValue::integer(1), array({}), PropertyValue()}) {
     EXPECT_EXIT(static_cast<void>(make_mutable(value)), testing::ExitedWithCode(255), "We are dead!");
     root.expect_log({"make_mutable: Could not create mutable copy! We are dead!"});

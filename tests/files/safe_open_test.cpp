@@ -58,6 +58,8 @@ TEST_F(SafeOpen, RefusesWhatIsNotExactlyTheObjectNamed) {
       {kHome + "/file/new", kRewrite, kRegularFile, failed(kHome + "/file/new", ENOTDIR)},
       {kHome + "/file", O_CREAT | O_EXCL | O_WRONLY, kRegularFile, failed(kHome + "/file", EEXIST)},
       {kHome + "/new/", kRewrite, kRegularFile, failed(kHome + "/new/", EISDIR)},
+      {kHome + "/.", kRewrite, kRegularFile, failed(kHome + "/.", EISDIR)},
+      {kHome + "/..", kRewrite, kRegularFile, failed(kHome + "/..", EISDIR)},
       {"", kRewrite, kRegularFile, failed("", ENOENT)},
       {"/var/mobile/file", kRewrite, kRegularFile, fishy("/var/mobile/file", kHome + "/file")},
       {"/var/mobile/new", kRewrite, kRegularFile, fishy("/var/mobile/new", kHome + "/new")},
@@ -114,7 +116,7 @@ TEST_F(SafeOpen, OpensCreatesAndTruncatesTheObjectNamed) {
     EXPECT_EQ(root.mode_of(c.path), c.mode);
     EXPECT_TRUE((c.flags & O_TRUNC) == 0 || root.read_file(c.path).empty());
   }
-  const Descriptor fifo(_safe_open((kHome + "/fifo").c_str(), O_RDWR | O_NONBLOCK, 0, 0x1000));
+  const Descriptor fifo(_safe_open((kHome + "/fifo").c_str(), O_RDWR | O_NONBLOCK | O_TRUNC, 0, 0x1000));
   EXPECT_EQ(::fcntl(fifo.get(), F_GETFL) & O_NONBLOCK, O_NONBLOCK);
 }
 

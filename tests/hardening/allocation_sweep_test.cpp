@@ -30,6 +30,9 @@ using allocations::Fault;
 constexpr const char* kPlist = "/private/var/mobile/file.plist";
 constexpr const char* kSetAside = "/private/var/mobile/Library/qvd/data_ark.plist.unreadable";
 constexpr const char* kDying = "make_mutable: Could not create mutable copy! We are dead!";
+// An array and, before it, the text that is its only element, in UTF-16.
+const std::string kBackwards = std::string("bplist00\x61\0\xe4\xa1\1\x0b\x08\0\0\0\0\0\0\1\1", 23) +
+                               std::string("\0\0\0\0\0\0\0\2\0\0\0\0\0\0\0\0\0\0\0\0\0\0\0\x0d", 24);
 const std::string kLong(300, 'k'), kOwn(9999, 'o');
 
 ScratchRoot* root = nullptr;
@@ -72,6 +75,8 @@ struct Things {
     ark.reset(data_ark_load());
     EXPECT_EQ(data_ark_set(ark.get(), key, key, key), 0);
     EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, {}, 3), 0);
+    EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, key, 5), 0);
+    EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, text("0"), 1), 0);
     EXPECT_EQ(data_ark_register_notification(ark.get(), domain, {}, text("name"), kEventSet), 0);
     root->write_file(kPlist, file);
     root->write_plist(kDataFile, entries("old", 20));
@@ -191,6 +196,8 @@ const Case kCases[] = {
      [](Things& t) { return all(t.value.mutable_copy(), t.list.mutable_copy(), t.bytes.mutable_copy()); }},
     {"make_mutable", [](Things& t) { return make_mutable(t.table) == t.table; }, 0, Kind::may_die},
     {"read_binary", [](Things& t) { return read_binary(t.file_bytes(), Mutability::immutable) == t.value; }},
+    {"read_binary, backwards",
+     [](Things&) { return read_binary(std::as_bytes(std::span(kBackwards)), Mutability::immutable).size() == 1; }},
     {"write_binary", [](Things& t) { return write_binary(t.value, t.out); }},
     {"comparing", [](Things& t) { return t.value == t.equal; }},
     {"store_dict", [](Things& t) { return store_dict(kPlist, t.table) == 0; }},

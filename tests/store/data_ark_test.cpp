@@ -261,6 +261,20 @@ TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
     ASSERT_TRUE(root.exists(kSetAside)) << name;
     EXPECT_TRUE(!is_readable || root.read_file(kSetAside) == content) << name;
   }
+  for (const bool is_gone : {true, false}) {
+    root.write_file(kFile, "garbage");
+    DataArk* ark = load_kept_ark();
+    data_ark_set(ark, nullptr, text("new"), text("x"));
+    root.remove(kSetAside);
+    root.make_directory(kSetAside + "/full");
+    if (is_gone) root.remove(kFile);
+    static_cast<void>(root.log_lines());
+    data_ark_store(ark);
+    const std::string refusal =
+        "data_ark_store: Could not set " + kFile + " aside as " + kSetAside + ": Is a directory";
+    root.expect_log({is_gone ? "data_ark_store: saved" : refusal});
+    EXPECT_EQ(root.read_file(kFile) == "garbage", !is_gone);
+  }
 }
 
 TEST(LiveAnswers, EveryRowIsFoundByItsOwnDomainAndKeyOnly) {
@@ -270,9 +284,15 @@ TEST(LiveAnswers, EveryRowIsFoundByItsOwnDomainAndKeyOnly) {
     EXPECT_EQ(find_live_answer(text("other"), text(row.key)), nullptr);
     EXPECT_EQ(find_live_answer(text(""), text(row.key)), nullptr) << "an empty domain is a domain";
     EXPECT_EQ(find_live_answer(domain, text(std::string(row.key) + "x")), nullptr);
+    EXPECT_EQ(larry_lookup(domain, text(row.key), 0), text(row.question));
+    EXPECT_TRUE(larry_lookup(domain, text(row.key), 1)
+                    .text()
+                    .ends_with(row.question_name.empty() ? row.question : row.question_name));
+    EXPECT_FALSE(larry_lookup(domain, text(row.key), 2));
   }
   EXPECT_EQ(find_live_answer(nullptr, text("BatteryIsCharging")), nullptr);
   EXPECT_EQ(find_live_answer(nullptr, nullptr), nullptr);
+  EXPECT_EQ(find_live_answer(nullptr, text("")), nullptr);
   EXPECT_EQ(find_live_answer(PropertyValue::integer(1), text("DieID")), &kLiveAnswers[37]) << "no string is no domain";
 }
 
