@@ -9,6 +9,7 @@
 #include <thread>
 #include <vector>
 
+#include "bench/cases/case.h"
 #include "bench/support/measurements.h"
 #include "bench/support/scratch_root.h"
 #include "bench/support/table.h"
@@ -69,6 +70,7 @@ int run(int argc, char** argv) {
   const ScratchRoot root;
   // The daemon has threads, so every contender pays for locks and counts as a process with threads does.
   std::thread([] {}).join();
+  for (const auto prepare : preparations()) prepare();
   Collector collector;
   benchmark::RunSpecifiedBenchmarks(&collector);
   if (file.empty()) {

@@ -10,6 +10,7 @@
 #include <mutex>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace quorvel::bench {
 
@@ -59,6 +60,12 @@ template <class Material>
   static std::mutex mutex;
   const std::lock_guard hold(mutex);
   return made.try_emplace(entries, entries).first->second;
+}
+
+/// What is made before the first case runs, so that nobody's memory lies in the gaps that other cases left behind.
+[[nodiscard]] inline std::vector<void (*)()>& preparations() {
+  static std::vector<void (*)()> all;
+  return all;
 }
 
 }  // namespace quorvel::bench

@@ -178,6 +178,7 @@ bool register_store() {
     add_case(std::string(work) + ", two threads", kSize, Store::kName, run)->Threads(2)->UseRealTime();
   }
   add_case("set new", kSize, Store::kName, set_new_case<Store>)->UseManualTime();
+  preparations().push_back([] { static_cast<void>(material<StoreMaterial<Store>>(kSize)); });
   return true;
 }
 

@@ -1,3 +1,5 @@
+#include <cstring>
+
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/device_information.h"
@@ -20,11 +22,32 @@ PropertyValue copy_live_answer(const larry_info& row) noexcept {
   return answer;
 }
 
-PropertyValue copy_domain_view(const DataArk& ark, std::string_view prefix) noexcept QUORVEL_REQUIRES(ark.lock) {
+// What store keys begin with. Domains share their beginning with each other, so the end is compared first.
+class Prefix {
+ public:
+  explicit Prefix(std::string_view text) noexcept : text_(text), end_(end_of(text)) {}
+  [[nodiscard]] bool begins(std::string_view key) const noexcept {
+    return key.size() >= text_.size() && end_of(key) == end_ && key.starts_with(text_);
+  }
+
+ private:
+  [[nodiscard]] std::uint64_t end_of(std::string_view key) const noexcept {
+    std::uint64_t end = 0;
+    if (text_.size() >= sizeof end) std::memcpy(&end, key.data() + text_.size() - sizeof end, sizeof end);
+    return end;
+  }
+
+  std::string_view text_;
+  std::uint64_t end_;
+};
+
+PropertyValue copy_domain_view(const DataArk& ark, std::string_view domain) noexcept QUORVEL_REQUIRES(ark.lock) {
+  const Prefix prefix(domain);
   PropertyValue view = PropertyValue::dictionary();
   for (const auto& [key, value] : ark.values.entries()) {
-    if (!key.text().starts_with(prefix)) continue;
-    if (!view.set(key.text().substr(prefix.size()), value)) return nullptr;
+    const std::string_view text = key.text();
+    if (!prefix.begins(text)) continue;
+    if (!view.set(text.substr(domain.size()), value)) return nullptr;
   }
   return view;
 }

@@ -89,9 +89,8 @@ PropertyValue PropertyValue::dictionary(std::size_t expected) noexcept {
   return adopt(word_of(new_dictionary(expected, kMutable)));
 }
 
-std::optional<std::int64_t> PropertyValue::to_int64() const noexcept {
-  if (kind() != PropertyKind::integer) return std::nullopt;
-  if (!is_node(word_)) return immediate_value(word_);
+std::optional<std::int64_t> PropertyValue::wide_to_int64() const noexcept {
+  if (!is_node(word_) || kind() != PropertyKind::integer) return std::nullopt;
   const auto* node = static_cast<const NumberNode*>(node_of(word_));
   if ((node->flags & kUnsigned) != 0) return std::nullopt;
   return static_cast<std::int64_t>(node->bits);

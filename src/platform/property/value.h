@@ -69,7 +69,10 @@ class [[nodiscard]] PropertyValue {
 
   /// The value's content; of another kind: false, nothing, 0 or empty. Views last as long as the value is held.
   [[nodiscard]] bool to_boolean() const noexcept { return word_ == detail::kTrue; }
-  [[nodiscard]] std::optional<std::int64_t> to_int64() const noexcept;
+  [[nodiscard]] std::optional<std::int64_t> to_int64() const noexcept {
+    if ((word_ & detail::kTagMask) == detail::kIntegerTag) return detail::immediate_value(word_);
+    return wide_to_int64();
+  }
   [[nodiscard]] std::optional<std::uint64_t> to_uint64() const noexcept;
   /// The number of a real, or the seconds of a date.
   [[nodiscard]] double to_double() const noexcept;
@@ -119,6 +122,7 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] detail::Word take() noexcept { return std::exchange(word_, 0); }
 
  private:
+  [[nodiscard]] std::optional<std::int64_t> wide_to_int64() const noexcept;
   [[nodiscard]] bool make_unique(PropertyKind kind) noexcept;
 
   detail::Word word_ = 0;
