@@ -28,6 +28,7 @@ namespace quorvel::test {
 using allocations::Fault;
 
 constexpr const char* kPlist = "/private/var/mobile/file.plist";
+constexpr StaticText kMarked = "marked";
 constexpr const char* kSetAside = "/private/var/mobile/Library/qvd/data_ark.plist.unreadable";
 constexpr const char* kDying = "make_mutable: Could not create mutable copy! We are dead!";
 // An array and, before it, the text that is its only element, in UTF-16.
@@ -75,7 +76,7 @@ struct Things {
     ark.reset(data_ark_load());
     EXPECT_EQ(data_ark_set(ark.get(), key, key, key), 0);
     EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, {}, 3), 0);
-    EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, key, 5), 0);
+    EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, kMarked, 5), 0);
     EXPECT_EQ(data_ark_add_to_class(ark.get(), domain, text("0"), 1), 0);
     EXPECT_EQ(data_ark_register_notification(ark.get(), domain, {}, text("name"), kEventSet), 0);
     root->write_file(kPlist, file);
@@ -207,6 +208,8 @@ const Case kCases[] = {
      nullptr, save_loaded},
     {"data_ark_store", [](Things& t) { return data_ark_store(t.ark.get()), t.data_file_changed(); }},
     {"data_ark_set", [](Things& t) { return data_ark_set(t.ark.get(), t.domain, t.key, t.key) == 0; }, 2},
+    {"data_ark_set, a marked key", [](Things& t) { return data_ark_set(t.ark.get(), t.domain, kMarked, t.key) == 0; },
+     2},
     {"data_ark_set, the first", [](Things& t) { return data_ark_set(t.empty_ark.get(), {}, t.key, t.key) == 0; }},
     {"data_ark_remove", [](Things& t) { return data_ark_remove(t.ark.get(), t.key, t.key) == 0; }},
     {"data_ark_exists", [](Things& t) { return data_ark_exists(t.ark.get(), t.key, t.key) == 1; }},

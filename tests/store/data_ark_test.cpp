@@ -115,6 +115,11 @@ TEST_F(DataArkTest, EdgesAnswerAsDocumented) {
   EXPECT_EQ(set(nullptr, text("own"), "x\ny"), 0);
   EXPECT_EQ(data_ark_copy(ark_, nullptr, nullptr), dictionary({{"own", "x\ny"}}));
   root_.expect_log({"data_ark_set: dirtied by changing a-b-c", "data_ark_set: dirtied by changing -own"});
+  for (const char* domain : {"com.example.a", "com.example.b", "org.example.a"}) {
+    EXPECT_EQ(set(text(domain), text("k"), domain), 0);
+    EXPECT_EQ(data_ark_copy(ark_, text(domain), nullptr), dictionary({{"k", domain}}));
+  }
+  EXPECT_EQ(root_.log_lines().size(), 3u);
 
   PropertyValue list = array({1});
   EXPECT_EQ(set(nullptr, text("list"), list), 0);

@@ -103,9 +103,9 @@ TEST(Binary, RefusesWhatIsNoPropertyList) {
   EXPECT_FALSE(decoded(file_of({"d1 01 02", "10 01", "09"}))) << "a key that is no text";
   EXPECT_FALSE(decoded(file_of({"d2 01 02 03 03", "51 'a'", "51 'a'", "09"}))) << "a key twice";
   EXPECT_FALSE(decoded(file_of({"09"}) + "x"));
-  std::string long_text = "5f 11 1001";
-  for (int i = 0; i < 0x1001; ++i) long_text += "80";
-  EXPECT_FALSE(decoded(file_of({long_text})));
+  std::string long_text = encoded(text(std::string(5000, 'a')));
+  long_text[4000] = '\x80';
+  EXPECT_FALSE(decoded(long_text));
   EXPECT_FALSE(
       decoded(bytes("'bplist00' 0000000000000000 5f 10 0000000000 00 01 01 0000000000000001 0000000000000000"
                     "0000000000000011")))
