@@ -4,6 +4,7 @@
 
 #include <bit>
 #include <cstdint>
+#include <string_view>
 
 #include "platform/property/node.h"
 
@@ -36,14 +37,16 @@ class IndexFiller {
   IndexFiller& operator=(const IndexFiller&) = delete;
   ~IndexFiller() { place_all(); }
 
-  /// Adds the entry behind those that are in use, whose key is `key`. With `check`, false when one of those has it,
+  /// Adds the entry behind those that are in use, whose key is `text`. With `check`, false when one of those has it,
   /// too.
-  [[nodiscard]] bool add(const HashedKey& key, bool check) noexcept {
+  [[nodiscard]] bool add(std::string_view text, bool check) noexcept {
+    // Without an index, only a search needs the hash.
+    if (dictionary_.index_size == 0) return !check || find_entry(dictionary_, text) == nullptr;
+    const HashedKey key(text);
     if (check) {
       place_all();
       if (find_entry(dictionary_, key) != nullptr) return false;
     }
-    if (dictionary_.index_size == 0) return true;
     if (added_ - placed_ == kUnderWay) place_next();
     hashes_[added_++ % kUnderWay] = key.hash;
     __builtin_prefetch(&dictionary_.index[key.hash & (dictionary_.index_size - 1)]);
