@@ -5,7 +5,7 @@
 #include "platform/property/binary_check.h"
 
 #include <cstdlib>
-#include <memory>
+#include <cstring>
 #include <string_view>
 
 #include "platform/property/binary_layout.h"

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <cstring>
 
 #include "platform/property/binary.h"
 #include "platform/property/leaf_table.h"
@@ -35,8 +36,10 @@ constexpr std::uint32_t kMaximumCredit = 4096;
 // meanwhile.
 constexpr std::size_t kFetchAhead = 16;
 
-// The room that an element takes in common files; a wrong guess costs another allocation.
+// The room that an element takes in common files; a wrong guess costs another allocation. No more than so much is asked
+// for on a guess: what many small elements do not need must not be what memory runs out for.
 constexpr std::size_t kLikelyElementRoom = 72;
+constexpr std::size_t kLargestGuess = std::size_t{4} << 20;
 
 inline void fetch(Word word) noexcept {
   if (is_node(word)) __builtin_prefetch(node_of(word));
@@ -274,7 +277,8 @@ std::byte* put_header(std::byte* at) noexcept {
 }
 
 bool Writer::put_objects() noexcept {
-  std::byte* at = grow(nullptr, format::kHeader.size() + kLeafRoom + root_.size() * kLikelyElementRoom);
+  const std::size_t likely = std::min(root_.size() * kLikelyElementRoom, kLargestGuess);
+  std::byte* at = grow(nullptr, format::kHeader.size() + kLeafRoom + likely);
   if (at == nullptr) return false;
   at = put_object(put_header(at), root_.word());
   std::size_t level_end = 1, depth = 1;
