@@ -23,16 +23,11 @@ std::string_view text_of(const EncodedObject& object) noexcept {
   return {reinterpret_cast<const char*>(object.body), object.size};
 }
 
-// Eight bytes can always be read, as a file does not end with an object.
+// A chunk can always be read, as a file does not end with an object.
 bool is_ascii_text(const EncodedObject& object) noexcept {
   if (object.size > kShortText) return is_ascii(text_of(object));
-  std::uint64_t all = 0;
-  visit_words(object.size, [&](std::size_t offset) {
-    std::uint64_t word;
-    std::memcpy(&word, object.body + offset, sizeof word);
-    all |= word;
-  });
-  return !has_high_bits(all, object.size);
+  const Chunk all = gather_chunks(object.body, object.size, [](std::size_t, const Chunk&) {});
+  return high_bits(all, object.size) == 0;
 }
 
 bool is_valid_leaf(const EncodedObject& object) noexcept {
@@ -61,7 +56,7 @@ class Checker {
       const std::uint64_t offset = layout_.offset_of(i);
       EncodedObject object;
       if (offset < end || !layout_.object_at(offset, object)) return false;
-      end = layout_.end_of(object);
+      end = layout_.offset_at(object.end);
       if (!(object.is_container() ? check_container(i, object) : is_valid_leaf(object))) return false;
     }
     EncodedObject top;

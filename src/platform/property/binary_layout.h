@@ -67,9 +67,15 @@ class BinaryLayout {
   [[nodiscard]] std::uint64_t offset_of(std::uint64_t index) const noexcept {
     return binary_format::get_integer(table_ + index * offset_size_, offset_size_);
   }
-  /// Where an object ends, counted as its offset is.
-  [[nodiscard]] std::uint64_t end_of(const EncodedObject& object) const noexcept {
-    return static_cast<std::uint64_t>(object.end - start_);
+  /// The byte at an offset inside the file, and the other way round.
+  [[nodiscard]] const std::byte* at(std::uint64_t offset) const noexcept { return start_ + offset; }
+  [[nodiscard]] std::uint64_t offset_at(const std::byte* at) const noexcept {
+    return static_cast<std::uint64_t>(at - start_);
+  }
+  /// Below this offset, what takes up to `size` bytes ends before the table.
+  [[nodiscard]] std::uint64_t limit_of(std::size_t size) const noexcept {
+    const std::uint64_t end = offset_at(table_);
+    return end < size ? 0 : end - size;
   }
   /// The reference at `at`, which may be out of range.
   [[nodiscard]] std::uint64_t reference_at(const std::byte* at) const noexcept {

@@ -20,22 +20,15 @@ using namespace detail;
 
 namespace {
 
-// What the table of objects holds is a word, and for a node what a container needs to know of it: many files are larger
-// than the processor's caches, and a node that was just made is already far away.
-constexpr Word kBlockTag = 2;  // a leaf in a block
-constexpr Word kTextTag = 4;
 // What stands for a container that is not made yet, or being made. Never retained, never handed out.
 constexpr Word kUnmade = 5;
 constexpr Word kInTheMaking = 5 | 8;
 
-bool is_immediate(Word made) noexcept { return (made & kImmediateBit) != 0; }
 bool is_text(Word made) noexcept { return (made & (kImmediateBit | kTextTag)) == kTextTag; }
-bool is_in_block(Word made) noexcept { return (made & (kImmediateBit | kBlockTag)) == kBlockTag; }
-Word plain_word(Word made) noexcept { return is_immediate(made) ? made : made & ~(kBlockTag | kTextTag); }
-Word tagged_leaf(Word word) noexcept {
-  if (!is_node(word)) return word;
-  const Node& node = *node_of(word);
-  return word | ((node.flags & kInBlock) != 0 ? kBlockTag : 0) | (node.kind == PropertyKind::string ? kTextTag : 0);
+bool has_own_count(Word made) noexcept { return (made & (kImmediateBit | kBlockTag)) == 0; }
+Word plain_word(Word made) noexcept {
+  const Word is_node = (made & kImmediateBit) - 1;
+  return made & ~(is_node & (kBlockTag | kTextTag));
 }
 
 using Object = EncodedObject;
@@ -58,7 +51,13 @@ class Reader {
   };
 
   bool make_leaves() noexcept;
+  bool make_short_leaves(std::uint64_t& end) noexcept;
   bool objects_overlap() const noexcept;
+  // Notes an object that has, or will have, a count of its own; releases it when memory runs out.
+  bool note_counted(std::uint64_t number) noexcept;
+  void release_made(std::uint64_t number) const noexcept {
+    if (has_own_count(made_[number])) release(plain_word(made_[number]));
+  }
 
   bool make_containers() noexcept;
   bool visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept;
@@ -82,14 +81,16 @@ class Reader {
   LeafAllocator leaves_;
   Word* made_ = nullptr;  // by the objects' numbers
   std::uint64_t made_count_ = 0;
+  std::uint64_t* counted_ = nullptr;  // the numbers of the objects that have counts of their own
+  std::size_t counted_count_ = 0;
+  std::size_t counted_room_ = 0;
   std::uint64_t containers_ = 0;
   std::uint64_t container_references_ = 0;
 };
 
 Reader::~Reader() {
-  for (std::uint64_t i = 0; i < made_count_; ++i) {
-    if (!is_immediate(made_[i]) && !is_in_block(made_[i])) release(plain_word(made_[i]));
-  }
+  for (std::size_t i = 0; i < counted_count_; ++i) release_made(counted_[i]);
+  std::free(counted_);
   std::free(made_);
 }
 
@@ -120,7 +121,7 @@ bool Reader::objects_overlap() const noexcept {
     Object object;
     const std::uint64_t offset = layout_.offset_of(i);
     if (!layout_.object_at(offset, object)) return true;
-    first[i] = {offset, layout_.end_of(object)};
+    first[i] = {offset, layout_.offset_at(object.end)};
   }
   std::sort(first, first + layout_.count(), [](const Extent& a, const Extent& b) { return a.begin < b.begin; });
   for (std::size_t i = 1; i < layout_.count(); ++i) {
@@ -129,12 +130,55 @@ bool Reader::objects_overlap() const noexcept {
   return false;
 }
 
+// Makes short leaves, one behind the other from the first object on that has no word yet, as long as each stands behind
+// the one before; `end` is where the last object ended. False when a text is none.
+bool Reader::make_short_leaves(std::uint64_t& end) noexcept {
+  // Bytes that are written may be anything's, to the compiler: what it must not read again is copied.
+  const BinaryLayout layout = layout_;
+  LeafAllocator::Room room = leaves_.room();
+  Word* const made = made_;
+  const std::uint64_t limit = layout.limit_of(kLargestShortObject);
+  std::uint64_t behind = end, i = made_count_;
+  Word word = kUnmade;
+  for (; i < layout.count() && room.end - room.at >= kShortLeafRoom; ++i) {
+    const std::uint64_t offset = layout.offset_of(i);
+    if (offset < behind || offset >= limit) break;
+    ShortLeaf leaf;
+    if (!find_short_leaf(layout.at(offset), leaf)) break;
+    word = make_short_leaf(leaf, room);
+    if (word == 0) break;
+    made[i] = word;
+    behind = layout.offset_at(leaf.body + leaf.size);
+  }
+  leaves_.fill(room);
+  made_count_ = i;
+  end = behind;
+  return word != 0;
+}
+
+bool Reader::note_counted(std::uint64_t number) noexcept {
+  if (counted_count_ == counted_room_) {
+    const std::size_t larger = std::max<std::size_t>(16, counted_room_ * 2);
+    void* grown = std::realloc(counted_, larger * sizeof *counted_);
+    if (grown == nullptr) {
+      release_made(number);
+      return false;
+    }
+    counted_ = static_cast<std::uint64_t*>(grown);
+    counted_room_ = larger;
+  }
+  counted_[counted_count_++] = number;
+  return true;
+}
+
 bool Reader::make_leaves() noexcept {
   bool may_overlap = true;  // until it is known that nothing does
-  std::uint64_t end = 0;
-  for (std::size_t i = 0; i < layout_.count(); ++i) {
+  std::uint64_t end = format::kHeader.size();
+  while (made_count_ < layout_.count()) {
+    if (!make_short_leaves(end)) return false;
+    if (made_count_ == layout_.count()) return true;
     Object object;
-    const std::uint64_t offset = layout_.offset_of(i);
+    const std::uint64_t offset = layout_.offset_of(made_count_);
     if (!layout_.object_at(offset, object)) return false;
     // Objects that stand in the order of their numbers are compared one by one; the first that does not has all of
     // them compared, before a leaf is made of it.
@@ -142,21 +186,22 @@ bool Reader::make_leaves() noexcept {
       if (objects_overlap()) return false;
       may_overlap = false;
     }
-    end = layout_.end_of(object);
-    const Word word = object.is_container() ? kUnmade : make_leaf(object, leaves_);
-    if (word == 0) return false;
-    made_[made_count_++] = tagged_leaf(word);
+    end = layout_.offset_at(object.end);
+    const Word made = object.is_container() ? kUnmade : tagged_leaf(make_leaf(object, leaves_));
+    if (made == 0) return false;
+    made_[made_count_++] = made;
+    if ((object.is_container() || has_own_count(made)) && !note_counted(made_count_ - 1)) return false;
   }
   return true;
 }
 
 inline Word Reader::take(Word made, Run& run) noexcept {
   const Word word = plain_word(made);
-  if (is_in_block(made)) {
-    run.add(node_of(word));
-  } else if (!is_immediate(made)) {
+  if (has_own_count(made)) {
     container_references_ += node_of(word)->kind >= PropertyKind::array ? 1 : 0;
     retain(word);
+  } else {
+    run.add_masked(node_of(word), (made & kImmediateBit) - 1);
   }
   return word;
 }
@@ -228,26 +273,31 @@ bool Reader::make_dictionary(const Object& object, Word& made) noexcept {
 
 // Takes the entries in use, all of them or those up to the first that is not sound.
 void Reader::fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept {
+  const BinaryLayout layout = layout_;
+  const Word* const made = made_;
   Entry* const entries = dictionary.entries();
   const std::byte* at = object.body;
-  const std::byte* values = object.body + object.size * layout_.reference_size();
+  const std::byte* values = object.body + object.size * layout.reference_size();
   std::string_view before;
   Run keys_run, values_run;
   IndexFiller index(dictionary);
-  for (std::uint32_t& i = dictionary.used; i < dictionary.capacity; ++i) {
-    const Word key = made_at(at), value = made_at(values);
-    if (value == 0 || !is_text(key)) break;
+  bool ascends = true;
+  std::uint32_t i = 0;
+  for (const std::uint32_t size = dictionary.capacity; i < size; ++i) {
+    const std::uint64_t key_number = layout.reference_at(at), value_number = layout.reference_at(values);
+    if (key_number >= layout.count() || value_number >= layout.count() || !is_text(made[key_number])) break;
     // Keys in ascending order are known to differ.
-    const std::string_view text = text_of(plain_word(key));
-    const bool ascends = dictionary.ascending == i && (i == 0 || stands_before(before, text));
+    const std::string_view text = text_of(plain_word(made[key_number]));
+    ascends = ascends && (i == 0 || stands_before(before, text));
+    if (!ascends) dictionary.used = i;
     if (!index.add(text, !ascends)) break;
-    entries[i] = {take(key, keys_run), take(value, values_run)};
-    dictionary.ascending += ascends ? 1 : 0;
+    entries[i] = {take(made[key_number], keys_run), take(made[value_number], values_run)};
+    if (ascends) dictionary.ascending = i + 1;
     before = text;
-    at += layout_.reference_size();
-    values += layout_.reference_size();
+    at += layout.reference_size();
+    values += layout.reference_size();
   }
-  dictionary.live = dictionary.used;
+  dictionary.used = dictionary.live = i;
 }
 
 }  // namespace

@@ -51,6 +51,42 @@ void fetch_elements(const ContainerNode& container) noexcept {
   for (std::size_t i = 0; i < std::min(count, kFetchAhead); ++i) fetch(words[i]);
 }
 
+// The keys, or the values, of a dictionary in their order.
+template <Word Entry::*part>
+class EntryRow {
+ public:
+  static constexpr bool kHasOnlyTexts = part == &Entry::key;
+  explicit EntryRow(const SortedEntries& sorted) noexcept
+      : entries_(sorted.entries()), order_(sorted.order()), size_(sorted.size()) {}
+  [[nodiscard]] std::size_t size() const noexcept { return size_; }
+  [[nodiscard]] Word operator[](std::size_t index) const noexcept {
+    const std::size_t ahead = index + kFetchAhead < size_ ? index + kFetchAhead : index;
+    if (order_ == nullptr) {
+      __builtin_prefetch(node_of(entries_[ahead].*part));
+      return entries_[index].*part;
+    }
+    __builtin_prefetch(node_of(entries_[order_[ahead]].*part));
+    return entries_[order_[index]].*part;
+  }
+
+ private:
+  const Entry* entries_;
+  const std::uint32_t* order_;
+  std::size_t size_;
+};
+
+// The elements of an array.
+class ElementRow {
+ public:
+  static constexpr bool kHasOnlyTexts = false;
+  explicit ElementRow(const ArrayNode& array) noexcept : array_(array) {}
+  [[nodiscard]] std::size_t size() const noexcept { return array_.used; }
+  [[nodiscard]] Word operator[](std::size_t index) const noexcept { return array_.items()[index]; }
+
+ private:
+  const ArrayNode& array_;
+};
+
 // Puts the objects of one value behind what the buffer holds. Every function that takes `at`, where the next byte goes,
 // returns where it ended, or null when it failed.
 class Writer {
@@ -87,9 +123,12 @@ class Writer {
   std::byte* put_new_leaf(std::byte* at, Word word) noexcept;
   std::byte* add_boolean(std::byte* at, Word word) noexcept;
   std::byte* add_leaf(std::byte* at, Word word, std::uint32_t& credit) noexcept;
-  std::byte* add_value(std::byte* at, Word word) noexcept;
+  std::byte* add_value(std::byte* at, Word word, std::uint32_t& credit) noexcept;
+  template <class Row>
+  std::byte* add_short_leaves(std::byte* at, std::size_t& first, Row row) noexcept;
+  template <class Row>
+  std::byte* add_row(std::byte* at, const Row& row, std::uint32_t& credit) noexcept;
   std::byte* add_elements(std::byte* at, const ContainerNode& container) noexcept;
-  std::byte* add_keys(std::byte* at, const SortedEntries& sorted) noexcept;
   std::byte* add_dictionary(std::byte* at, const DictionaryNode& dictionary) noexcept;
   std::byte* add_array(std::byte* at, const ArrayNode& array) noexcept;
   void refer(std::size_t number) noexcept;
@@ -229,22 +268,64 @@ inline std::byte* Writer::add_leaf(std::byte* at, Word word, std::uint32_t& cred
   return put_new_leaf(at, word);
 }
 
-inline std::byte* Writer::add_value(std::byte* at, Word word) noexcept {
+std::byte* Writer::add_value(std::byte* at, Word word, std::uint32_t& credit) noexcept {
   if (!is_node(word)) {
-    return kind_of(word) == PropertyKind::boolean ? add_boolean(at, word) : add_leaf(at, word, value_credit_);
+    return kind_of(word) == PropertyKind::boolean ? add_boolean(at, word) : add_leaf(at, word, credit);
   }
-  if (node_of(word)->kind < PropertyKind::array) return add_leaf(at, word, value_credit_);
+  if (node_of(word)->kind < PropertyKind::array) return add_leaf(at, word, credit);
   refer(count_);
   return put_container(at, word);
 }
 
-// The keys of one dictionary differ: in a large one they are not looked up among each other.
-std::byte* Writer::add_keys(std::byte* at, const SortedEntries& sorted) noexcept {
-  std::uint32_t none = 0;
-  std::uint32_t& credit = sorted.size() > kCredit ? none : key_credit_;
-  for (std::size_t i = 0; i < sorted.size() && at != nullptr; ++i) {
-    if (i + kFetchAhead < sorted.size()) fetch(sorted[i + kFetchAhead].key);
-    at = add_leaf(at, sorted[i].key, credit);
+// Refers to short leaves, one behind the other from element `first` on, and puts them; moves `first` to the first
+// element that is none, or for which there is no room. Their kinds cannot be foreseen, and a branch on one is
+// mispredicted: what is chosen here is chosen with masks, because compilers make branches of conditions.
+template <class Row>
+std::byte* Writer::add_short_leaves(std::byte* at, std::size_t& first, const Row row) noexcept {
+  // Bytes that are written may be anything's, to the compiler: what it must not read again is copied.
+  std::byte* const start = start_;
+  const std::byte* const end = end_;
+  std::uint32_t* const offsets = offsets_;
+  const std::size_t reference_size = reference_size_;
+  const std::uint32_t booleans[2] = {booleans_[0], booleans_[1]};
+  std::byte* reference = start + next_reference_;
+  std::size_t count = count_;
+  std::size_t i = first;
+  const std::size_t last = std::min(row.size(), i + (offsets_room_ - count));
+  for (; i < last && static_cast<std::size_t>(end - at) >= kLeafRoom; ++i) {
+    const Word word = row[i];
+    std::size_t number = count, is_boolean = 0;
+    if constexpr (Row::kHasOnlyTexts) {
+      if (!is_short_leaf(*bytes_of(word))) break;
+      offsets[count++] = static_cast<std::uint32_t>(at - start);
+      at = put_short_leaf(at, *bytes_of(word));
+    } else {
+      const IntegerLeaf integer(word);
+      const Word is_immediate = 0 - (word & kImmediateBit);
+      const BytesNode& leaf = *bytes_of(word ^ ((word ^ word_of(&integer)) & is_immediate));
+      if (!is_short_leaf(leaf)) break;
+      is_boolean = 0 - (word >> 1 & is_immediate & 1);
+      number = (count & ~is_boolean) | (booleans[word >> 3 & 1] & is_boolean);
+      if (number == 0) break;
+      offsets[count] = static_cast<std::uint32_t>(at - start);
+      count += 1 + is_boolean;
+      at += static_cast<std::size_t>(put_short_leaf(at, leaf) - at) & ~is_boolean;
+    }
+    format::put_integer(reference, number, reference_size);
+    reference += reference_size;
+  }
+  first = i;
+  count_ = count;
+  next_reference_ = static_cast<std::size_t>(reference - start);
+  return at;
+}
+
+// Elements that are looked up, and those that are no short leaves, are added one by one.
+template <class Row>
+std::byte* Writer::add_row(std::byte* at, const Row& row, std::uint32_t& credit) noexcept {
+  for (std::size_t i = 0; i < row.size() && at != nullptr;) {
+    if (credit == 0) at = add_short_leaves(at, i, row);
+    if (i < row.size()) at = add_value(at, row[i++], credit);
   }
   return at;
 }
@@ -253,17 +334,14 @@ std::byte* Writer::add_dictionary(std::byte* at, const DictionaryNode& dictionar
   const bool is_top = &dictionary == queue_[0].container;
   const SortedEntries sorted(dictionary, is_top ? &omitted_ : nullptr);
   if (!sorted) return nullptr;
-  at = add_keys(at, sorted);
-  for (std::size_t i = 0; i < sorted.size() && at != nullptr; ++i) {
-    if (i + kFetchAhead < sorted.size()) fetch(sorted[i + kFetchAhead].value);
-    at = add_value(at, sorted[i].value);
-  }
-  return at;
+  // The keys of one dictionary differ: in a large one they are not looked up among each other.
+  std::uint32_t none = 0;
+  at = add_row(at, EntryRow<&Entry::key>(sorted), sorted.size() > kCredit ? none : key_credit_);
+  return at == nullptr ? nullptr : add_row(at, EntryRow<&Entry::value>(sorted), value_credit_);
 }
 
 std::byte* Writer::add_array(std::byte* at, const ArrayNode& array) noexcept {
-  for (std::size_t i = 0; i < array.used && at != nullptr; ++i) at = add_value(at, array.items()[i]);
-  return at;
+  return add_row(at, ElementRow(array), value_credit_);
 }
 
 std::byte* Writer::add_elements(std::byte* at, const ContainerNode& container) noexcept {

@@ -27,9 +27,11 @@ class BlockRun {
   ~BlockRun() { settle(); }
 
   /// Gathers a reference to a leaf that lies in a block. Only a leaf of another block than the last one's is looked at.
-  void add(const Node* leaf) noexcept {
-    if (reinterpret_cast<std::uintptr_t>(leaf) - reinterpret_cast<std::uintptr_t>(block_) >= size_) move_to(leaf);
-    ++references_;
+  void add(const Node* leaf) noexcept { add_masked(leaf, ~Word{0}); }
+  /// The same where `mask` has all bits set, and nothing, without a branch, where it has none.
+  void add_masked(const Node* leaf, Word mask) noexcept {
+    if (((word_of(leaf) - reinterpret_cast<Word>(block_)) & mask) >= size_) move_to(leaf);
+    references_ += mask & 1;
   }
 
  private:
@@ -44,7 +46,7 @@ class BlockRun {
   }
 
   Block* block_ = nullptr;
-  std::size_t size_ = 0;
+  std::size_t size_ = 1;
   std::uint64_t references_ = 0;
 };
 

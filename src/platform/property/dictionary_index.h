@@ -21,6 +21,8 @@ inline constexpr std::uint32_t kUnindexed = 8;
 /// Puts an entry that is not there yet into an index with room for it.
 inline void place(IndexSlot* index, std::uint32_t mask, IndexSlot slot) noexcept {
   std::uint32_t at = slot.hash & mask;
+  // Whether a slot is taken cannot be foreseen: the first steps are made without a branch.
+  for (int step = 0; step < 2; ++step) at = (at + (index[at].entry != 0 ? 1 : 0)) & mask;
   while (index[at].entry != 0) at = (at + 1) & mask;
   index[at] = slot;
 }
@@ -32,7 +34,8 @@ inline void place(IndexSlot* index, std::uint32_t mask, IndexSlot slot) noexcept
 /// slots of a large index are far away: each is fetched while others are filled.
 class IndexFiller {
  public:
-  explicit IndexFiller(DictionaryNode& dictionary) noexcept : dictionary_(dictionary) {}
+  explicit IndexFiller(DictionaryNode& dictionary) noexcept
+      : dictionary_(dictionary), index_(dictionary.index), mask_(dictionary.index_size - 1) {}
   IndexFiller(const IndexFiller&) = delete;
   IndexFiller& operator=(const IndexFiller&) = delete;
   ~IndexFiller() { place_all(); }
@@ -41,32 +44,33 @@ class IndexFiller {
   /// too.
   [[nodiscard]] bool add(std::string_view text, bool check) noexcept {
     // Without an index, only a search needs the hash.
-    if (dictionary_.index_size == 0) return !check || find_entry(dictionary_, text) == nullptr;
+    if (index_ == nullptr) return !check || find_entry(dictionary_, text) == nullptr;
     const HashedKey key(text);
     if (check) {
       place_all();
       if (find_entry(dictionary_, key) != nullptr) return false;
     }
-    if (added_ - placed_ == kUnderWay) place_next();
-    hashes_[added_++ % kUnderWay] = key.hash;
-    __builtin_prefetch(&dictionary_.index[key.hash & (dictionary_.index_size - 1)]);
+    if (waiting_ == kUnderWay) place_all();
+    hashes_[waiting_++] = key.hash;
+    __builtin_prefetch(&index_[key.hash & mask_]);
     return true;
   }
 
  private:
-  static constexpr std::uint32_t kUnderWay = 16;
+  static constexpr std::uint32_t kUnderWay = 32;
 
-  void place_next() noexcept {
-    const std::uint32_t hash = hashes_[placed_++ % kUnderWay];
-    place(dictionary_.index, dictionary_.index_size - 1, {hash, placed_});
-  }
   void place_all() noexcept {
-    while (placed_ < added_) place_next();
+    IndexSlot* const index = index_;
+    const std::uint32_t mask = mask_;
+    for (std::uint32_t i = 0; i < waiting_; ++i) place(index, mask, {hashes_[i], ++placed_});
+    waiting_ = 0;
   }
 
   DictionaryNode& dictionary_;
-  std::uint32_t added_ = 0;
+  IndexSlot* index_;
+  std::uint32_t mask_;
   std::uint32_t placed_ = 0;
+  std::uint32_t waiting_ = 0;
   std::uint32_t hashes_[kUnderWay];
 };
 

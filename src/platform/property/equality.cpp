@@ -26,13 +26,7 @@ bool equal_dictionaries(const PropertyValue& left, const PropertyValue& right, W
 }
 
 bool equal_leaves(const PropertyValue& left, const PropertyValue& right) noexcept {
-  if (!is_node(left.word()) || !is_node(right.word())) return false;
-  if (left.kind() == PropertyKind::string || left.kind() == PropertyKind::data) {
-    return text_of(left.word()) == text_of(right.word());
-  }
-  const auto* a = static_cast<const NumberNode*>(node_of(left.word()));
-  const auto* b = static_cast<const NumberNode*>(node_of(right.word()));
-  return a->bits == b->bits && (a->flags & kUnsigned) == (b->flags & kUnsigned);
+  return is_node(left.word()) && is_node(right.word()) && text_of(left.word()) == text_of(right.word());
 }
 
 bool equal(const PropertyValue& left, const PropertyValue& right, WalkBudget& budget) noexcept {

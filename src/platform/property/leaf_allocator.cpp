@@ -37,12 +37,4 @@ BytesNode* LeafAllocator::add_large(PropertyKind kind, std::size_t length, std::
   return new (memory) BytesNode{{1, kind, flags, 0}, static_cast<std::uint32_t>(length)};
 }
 
-Word LeafAllocator::add_number(PropertyKind kind, std::uint64_t bits, std::uint8_t flags) noexcept {
-  void* memory = take(sizeof(NumberNode));
-  if (memory == nullptr) return 0;
-  auto* node = new (memory) NumberNode{{distance(memory), kind, static_cast<std::uint8_t>(flags | kInBlock), 0}, {}};
-  node->bits = bits;
-  return word_of(node);
-}
-
 }  // namespace quorvel::detail

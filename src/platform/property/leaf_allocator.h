@@ -26,6 +26,16 @@ class LeafAllocator {
   /// Prepares for a file of `file_size` bytes: a small file gets a small block.
   void start(std::size_t file_size) noexcept;
 
+  /// The free part of the newest block, for a caller that puts leaves there by itself.
+  struct Room {
+    char* at;
+    char* end;
+    const char* block;
+  };
+  [[nodiscard]] Room room() const noexcept { return {at_, end_, reinterpret_cast<const char*>(newest_)}; }
+  /// Takes back what `room` gave, with leaves up to `room.at`.
+  void fill(const Room& room) noexcept { at_ = room.at; }
+
   /// A leaf whose bytes the caller fills in, or null. A leaf of its own memory comes with one reference; a leaf in a
   /// block with none: it lives at least as long as this allocator.
   [[nodiscard]] BytesNode* add_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
@@ -35,8 +45,6 @@ class LeafAllocator {
     return new (memory) BytesNode{{distance(memory), kind, static_cast<std::uint8_t>(flags | kInBlock), 0},
                                   static_cast<std::uint32_t>(length)};
   }
-  /// 0 when memory runs out.
-  [[nodiscard]] Word add_number(PropertyKind kind, std::uint64_t bits, std::uint8_t flags) noexcept;
 
  private:
   [[nodiscard]] static BytesNode* add_large(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept;

@@ -6,28 +6,15 @@ namespace quorvel::detail {
 
 namespace {
 
-std::uint32_t hash_bits(std::uint64_t bits) noexcept {
-  return static_cast<std::uint32_t>(mix(bits ^ kHashSeed, 0x9e3779b97f4a7c15) >> 16);
-}
-
 std::uint32_t hash_leaf(Word leaf) noexcept {
-  if (!is_node(leaf)) return hash_bits(leaf);
-  switch (node_of(leaf)->kind) {
-    case PropertyKind::string: return hash_text(text_of(leaf));
-    case PropertyKind::data: return ~hash_text(text_of(leaf));
-    default: return hash_bits(static_cast<const NumberNode*>(node_of(leaf))->bits);
-  }
+  if (is_node(leaf)) return hash_text(text_of(leaf));
+  return static_cast<std::uint32_t>(mix(leaf ^ kHashSeed, 0x9e3779b97f4a7c15) >> 16);
 }
 
 bool same_leaf(Word left, Word right) noexcept {
   if (left == right) return true;
-  if (!is_node(left) || !is_node(right)) return false;
-  const Node* a = node_of(left);
-  const Node* b = node_of(right);
-  if (a->kind != b->kind) return false;
-  if (a->kind == PropertyKind::string || a->kind == PropertyKind::data) return text_of(left) == text_of(right);
-  return static_cast<const NumberNode*>(a)->bits == static_cast<const NumberNode*>(b)->bits &&
-         (a->flags & kUnsigned) == (b->flags & kUnsigned);
+  return is_node(left) && is_node(right) && node_of(left)->kind == node_of(right)->kind &&
+         text_of(left) == text_of(right);
 }
 
 }  // namespace
@@ -47,7 +34,7 @@ bool LeafTable::resize(std::size_t size) noexcept {
   return true;
 }
 
-LeafTable::Outcome LeafTable::find_or_add(Word leaf, std::uint32_t& number) noexcept {
+LeafTable::Outcome LeafTable::search(Word leaf, std::uint32_t& number) noexcept {
   if (used_ * 2 >= size_ && !resize(std::max<std::size_t>(64, size_ * 2))) return Outcome::no_memory;
   const std::uint32_t hash = hash_leaf(leaf);
   std::size_t at = hash & (size_ - 1);

@@ -2,6 +2,9 @@
 // `leaf_room` bytes, and returns where it ended.
 #pragma once
 
+#include <algorithm>
+#include <array>
+#include <bit>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -14,38 +17,27 @@
 namespace quorvel::detail {
 
 /// Room for every leaf but the bytes of a text or data value, in bytes.
-inline constexpr std::size_t kLeafRoom = 64;
-
-[[nodiscard]] inline bool holds_bytes(Word word) noexcept {
-  const PropertyKind kind = node_of(word)->kind;
-  return kind == PropertyKind::string || kind == PropertyKind::data;
-}
+inline constexpr std::size_t kLeafRoom = 72;
 
 /// Room that is enough for putting a leaf, in bytes.
 [[nodiscard]] inline std::size_t leaf_room(Word word) noexcept {
   // A character of UTF-8 takes at most two bytes of UTF-16 for each of its own.
-  return is_node(word) && holds_bytes(word) ? kLeafRoom + std::size_t{bytes_of(word)->length} * 2 : kLeafRoom;
+  return is_node(word) ? kLeafRoom + std::size_t{bytes_of(word)->length} * 2 : kLeafRoom;
 }
 
 // What is written without a branch may reach beyond the leaf: it is overwritten by what comes next.
 
-inline std::byte* put_bytes(std::byte* at, const BytesNode& node) noexcept {
-  const char* from = node.bytes();
-  const std::size_t length = node.length;
-  if (length <= kShortText) {
-    visit_words(length, [=](std::size_t offset) { std::memcpy(at + offset, from + offset, 8); });
-  } else if (length <= 64) {
-    std::memcpy(at, from, 32);
-    std::memcpy(at + length - 32, from + length - 32, 32);
-  } else {
-    std::memcpy(at, from, length);
-  }
-  return at + length;
-}
-
 /// The width of the smallest integer that holds `bits`, as a power of two.
 [[nodiscard]] inline unsigned width_exponent(std::uint64_t bits) noexcept {
-  return (bits > 0xff ? 1U : 0U) + (bits > 0xffff ? 1U : 0U) + (bits > 0xffff'ffff ? 1U : 0U);
+  // A table, because compilers make branches of comparisons.
+  static constexpr auto kExponents = [] {
+    std::array<std::uint8_t, 65> exponents{};
+    for (std::size_t i = 0; i < exponents.size(); ++i) {
+      exponents[i] = static_cast<std::uint8_t>(i <= 8 ? 0 : i <= 16 ? 1 : i <= 32 ? 2 : 3);
+    }
+    return exponents;
+  }();
+  return kExponents[static_cast<std::size_t>(std::bit_width(bits | 1))];
 }
 
 inline std::byte* put_integer(std::byte* at, std::int64_t value) noexcept {
@@ -64,24 +56,58 @@ inline std::byte* put_marker(std::byte* at, unsigned kind, std::uint64_t size) n
   return is_long ? end : at + 1;
 }
 
-inline std::byte* put_wide_text(std::byte* at, const BytesNode& text) noexcept {
-  return write_utf16(text.view(), put_marker(at, binary_format::kUtf16Text, utf16_units(text.view())));
+/// Whether a leaf is of those that a file is mostly made of: `put_short_leaf` puts it without a branch.
+[[nodiscard]] inline bool is_short_leaf(const BytesNode& leaf) noexcept {
+  return (leaf.flags & kVerbatim) != 0 && leaf.length <= kShortText;
 }
 
-// An integer beyond what a word holds, a real or a date.
-inline std::byte* put_number(std::byte* at, const NumberNode& number) noexcept {
+/// What stands before the bytes of a short leaf: its marker, and its length where the marker has no room for it.
+struct ShortHead {
+  std::array<std::uint8_t, 3> bytes;
+  std::uint8_t size;  // how many of the bytes
+};
+
+/// By kind and length.
+inline constexpr auto kShortHeads = [] {
   namespace format = binary_format;
-  if (number.kind == PropertyKind::date || number.kind == PropertyKind::real) {
-    *at++ = static_cast<std::byte>(number.kind == PropertyKind::date ? format::kDate : format::kReal << 4 | 3);
-  } else if ((number.flags & kUnsigned) == 0) {
-    return put_integer(at, static_cast<std::int64_t>(number.bits));
-  } else {
-    *at++ = static_cast<std::byte>(format::kInteger << 4 | 4);
-    format::put_integer(at, 0, 8);
-    at += 8;
+  std::array<std::array<ShortHead, 64>, 8> heads{};
+  const auto set = [&](PropertyKind kind, std::size_t length, unsigned high, std::size_t low) {
+    heads[static_cast<std::size_t>(kind)][length] = {
+        {static_cast<std::uint8_t>(high << 4 | low), format::kInteger << 4, static_cast<std::uint8_t>(length)},
+        static_cast<std::uint8_t>(low < format::kLongSize ? 1 : 3)};
+  };
+  for (std::size_t n = 0; n <= kShortText; ++n) {
+    set(PropertyKind::string, n, format::kAsciiText, std::min<std::size_t>(n, format::kLongSize));
+    set(PropertyKind::data, n, format::kData, std::min<std::size_t>(n, format::kLongSize));
   }
-  format::put_integer(at, number.bits, 8);
-  return at + 8;
+  for (unsigned n = 0; n <= 4; ++n) set(PropertyKind::integer, std::size_t{1} << n, format::kInteger, n);
+  set(PropertyKind::real, 8, format::kReal, 3);
+  set(PropertyKind::date, 8, format::kDate >> 4, format::kDate & 15);
+  return heads;
+}();
+
+/// An integer that is held in a word, as a leaf whose bytes are those that stand in a file.
+struct IntegerLeaf : BytesNode {
+  explicit IntegerLeaf(Word word) noexcept : BytesNode{{0, PropertyKind::integer, kVerbatim, 0}, 0} {
+    const auto bits = static_cast<std::uint64_t>(immediate_value(word));
+    length = 1U << width_exponent(bits);
+    binary_format::put_integer(reinterpret_cast<std::byte*>(bytes()), bits << (64 - 8 * length), 8);
+  }
+  char room[20];
+};
+
+inline std::byte* put_short_leaf(std::byte* at, const BytesNode& leaf) noexcept {
+  const std::size_t length = leaf.length;
+  const ShortHead& head = kShortHeads[static_cast<std::size_t>(leaf.kind)][length];
+  std::memcpy(at, &head, sizeof head);
+  at += head.size;
+  const char* from = leaf.bytes();
+  visit_chunks(length, [=](std::size_t offset) { std::memcpy(at + offset, from + offset, sizeof(Chunk)); });
+  return at + length;
+}
+
+inline std::byte* put_wide_text(std::byte* at, const BytesNode& text) noexcept {
+  return write_utf16(text.view(), put_marker(at, binary_format::kUtf16Text, utf16_units(text.view())));
 }
 
 /// Puts a leaf; there must be room for `leaf_room` bytes. Returns where it ends.
@@ -92,11 +118,12 @@ inline std::byte* put_leaf(std::byte* at, Word word) noexcept {
     *at = static_cast<std::byte>(word == kTrue ? format::kTrue : format::kFalse);
     return at + 1;
   }
-  if (!holds_bytes(word)) return put_number(at, *static_cast<const NumberNode*>(node_of(word)));
-  const BytesNode& bytes = *bytes_of(word);
-  const bool is_data = bytes.kind == PropertyKind::data;
-  if (!is_data && (bytes.flags & kAscii) == 0) return put_wide_text(at, bytes);
-  return put_bytes(put_marker(at, is_data ? format::kData : format::kAsciiText, bytes.length), bytes);
+  const BytesNode& leaf = *bytes_of(word);
+  if ((leaf.flags & kVerbatim) == 0) return put_wide_text(at, leaf);
+  if (is_short_leaf(leaf)) return put_short_leaf(at, leaf);
+  at = put_marker(at, leaf.kind == PropertyKind::data ? format::kData : format::kAsciiText, leaf.length);
+  std::memcpy(at, leaf.bytes(), leaf.length);
+  return at + leaf.length;
 }
 
 }  // namespace quorvel::detail

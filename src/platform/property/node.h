@@ -43,10 +43,9 @@ enum NodeFlag : std::uint8_t {
   kInBlock = 1,         // `count` is the distance to the block's head in eight-byte steps
   kStatic = 2,          // never counted, never freed
   kMutable = 4,         // accepts changes
-  kAscii = 8,           // a text without a byte above 0x7f
+  kVerbatim = 8,        // a leaf whose bytes stand in a file as they are: every one but a text with a byte above 0x7f
   kEncoded = 16,        // a dictionary that is still its bytes: see encoded.cpp
-  kUnsigned = 32,       // an integer above the signed range
-  kInlineStorage = 64,  // a container whose first slots lie in its own allocation
+  kInlineStorage = 32,  // a container whose first slots lie in its own allocation
 };
 
 struct Node {
@@ -57,27 +56,21 @@ struct Node {
 };
 static_assert(sizeof(Node) == 8);
 
-// String or data. The bytes follow directly.
+// String, data, or a number that no word holds: a real, a date, or an integer outside the immediate range. The bytes
+// follow directly; a number's are those that stand in a file, eight of them, or sixteen above the signed range.
 struct BytesNode : Node {
   std::uint32_t length;
   [[nodiscard]] const char* bytes() const noexcept { return reinterpret_cast<const char*>(this) + kBytesOffset; }
   [[nodiscard]] char* bytes() noexcept { return reinterpret_cast<char*>(this) + kBytesOffset; }
   [[nodiscard]] std::string_view view() const noexcept { return {bytes(), length}; }
   static constexpr std::size_t kBytesOffset = 12;
-  /// The memory for so many bytes. The first eight can always be read, so that a short text needs no copy byte by byte.
+  /// The memory for so many bytes. The first sixteen can always be read and written, so that a short text needs no copy
+  /// byte by byte.
   [[nodiscard]] static constexpr std::size_t allocation(std::size_t length) noexcept {
-    return kBytesOffset + (length < 12 ? 12 : length);
+    return kBytesOffset + (length < 20 ? 20 : length);
   }
 };
 static_assert(sizeof(BytesNode) == BytesNode::kBytesOffset);
-
-// Integer outside the immediate range, real or date.
-struct NumberNode : Node {
-  union {
-    std::uint64_t bits;
-    double number;
-  };
-};
 
 // The head of a block of leaves that share one count.
 struct Block {

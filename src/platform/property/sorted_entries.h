@@ -21,17 +21,17 @@ class SortedEntries {
 
   [[nodiscard]] explicit operator bool() const noexcept { return valid_; }
   [[nodiscard]] std::size_t size() const noexcept { return size_; }
-  [[nodiscard]] const Entry& operator[](std::size_t index) const noexcept {
-    return order_ == nullptr ? entries_[index] : entries_[order_[index]];
-  }
+  /// The row that the entries lie in, and their places there; no places where they stand in order and without gaps.
+  [[nodiscard]] const Entry* entries() const noexcept { return entries_; }
+  [[nodiscard]] const std::uint32_t* order() const noexcept { return order_; }
 
  private:
   void find_order(const DictionaryNode& dictionary) noexcept;
   void leave_out(const OmittedEntries& omitted) noexcept;
 
   const Entry* entries_;
-  const std::uint32_t* order_ = nullptr;  // null where the entries stand in order and without gaps
-  std::uint32_t* own_ = nullptr;          // the order where it is not the dictionary's
+  const std::uint32_t* order_ = nullptr;
+  std::uint32_t* own_ = nullptr;  // the order where it is not the dictionary's
   std::size_t size_;
   bool valid_ = true;
 };

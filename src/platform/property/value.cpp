@@ -6,6 +6,7 @@
 #include <limits>
 #include <new>
 
+#include "platform/property/binary_format.h"
 #include "platform/property/unicode.h"
 
 namespace quorvel {
@@ -16,19 +17,24 @@ namespace {
 
 const PropertyValue kNone;
 
-NumberNode* new_number(PropertyKind kind, std::uint64_t bits, std::uint8_t flags) noexcept {
-  void* memory = std::malloc(sizeof(NumberNode));
-  if (memory == nullptr) return nullptr;
-  auto* node = new (memory) NumberNode{{1, kind, flags, 0}, {}};
-  node->bits = bits;
-  return node;
-}
-
 BytesNode* new_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
   if (length > std::numeric_limits<std::uint32_t>::max()) return nullptr;
   void* memory = std::malloc(BytesNode::allocation(length));
   if (memory == nullptr) return nullptr;
   return new (memory) BytesNode{{1, kind, flags, 0}, static_cast<std::uint32_t>(length)};
+}
+
+PropertyValue new_number(PropertyKind kind, std::uint64_t bits, std::size_t length = 8) noexcept {
+  BytesNode* node = new_bytes(kind, length, kVerbatim);
+  if (node == nullptr) return nullptr;
+  auto* bytes = reinterpret_cast<std::byte*>(node->bytes());
+  std::memset(bytes, 0, length);
+  binary_format::put_integer(bytes + length - 8, bits, 8);
+  return PropertyValue::adopt(word_of(node));
+}
+
+std::uint64_t bits_of(const BytesNode& number) noexcept {
+  return binary_format::get_integer(reinterpret_cast<const std::byte*>(number.bytes()) + number.length - 8, 8);
 }
 
 void copy_bytes(char* to, std::string_view from) noexcept {
@@ -39,35 +45,35 @@ void copy_bytes(char* to, std::string_view from) noexcept {
 
 PropertyValue PropertyValue::integer(std::int64_t value) noexcept {
   if (value >= kImmediateMinimum && value <= kImmediateMaximum) return adopt(immediate_integer(value));
-  return adopt(word_of(new_number(PropertyKind::integer, static_cast<std::uint64_t>(value), 0)));
+  return new_number(PropertyKind::integer, static_cast<std::uint64_t>(value));
 }
 
 PropertyValue PropertyValue::unsigned_integer(std::uint64_t value) noexcept {
   if (value <= std::uint64_t{std::numeric_limits<std::int64_t>::max()}) {
     return integer(static_cast<std::int64_t>(value));
   }
-  return adopt(word_of(new_number(PropertyKind::integer, value, kUnsigned)));
+  return new_number(PropertyKind::integer, value, 16);
 }
 
 PropertyValue PropertyValue::real(double value) noexcept {
-  return adopt(word_of(new_number(PropertyKind::real, std::bit_cast<std::uint64_t>(value), 0)));
+  return new_number(PropertyKind::real, std::bit_cast<std::uint64_t>(value));
 }
 
 PropertyValue PropertyValue::date(double seconds) noexcept {
-  return adopt(word_of(new_number(PropertyKind::date, std::bit_cast<std::uint64_t>(seconds), 0)));
+  return new_number(PropertyKind::date, std::bit_cast<std::uint64_t>(seconds));
 }
 
 PropertyValue PropertyValue::string(std::string_view utf8) noexcept {
   const TextCheck check = check_utf8(utf8);
   if (check == TextCheck::invalid) return nullptr;
-  BytesNode* node = new_bytes(PropertyKind::string, utf8.size(), check == TextCheck::ascii ? kAscii : 0);
+  BytesNode* node = new_bytes(PropertyKind::string, utf8.size(), check == TextCheck::ascii ? kVerbatim : 0);
   if (node != nullptr) copy_bytes(node->bytes(), utf8);
   return adopt(word_of(node));
 }
 
 PropertyValue PropertyValue::joined_string(std::string_view head, std::string_view tail) noexcept {
   const bool ascii = is_ascii(head) && is_ascii(tail);
-  BytesNode* node = new_bytes(PropertyKind::string, head.size() + tail.size(), ascii ? kAscii : 0);
+  BytesNode* node = new_bytes(PropertyKind::string, head.size() + tail.size(), ascii ? kVerbatim : 0);
   if (node != nullptr) {
     copy_bytes(node->bytes(), head);
     copy_bytes(node->bytes() + head.size(), tail);
@@ -76,7 +82,7 @@ PropertyValue PropertyValue::joined_string(std::string_view head, std::string_vi
 }
 
 PropertyValue PropertyValue::data(std::span<const std::byte> bytes) noexcept {
-  BytesNode* node = new_bytes(PropertyKind::data, bytes.size(), 0);
+  BytesNode* node = new_bytes(PropertyKind::data, bytes.size(), kVerbatim);
   if (node != nullptr) copy_bytes(node->bytes(), {reinterpret_cast<const char*>(bytes.data()), bytes.size()});
   return adopt(word_of(node));
 }
@@ -91,16 +97,14 @@ PropertyValue PropertyValue::dictionary(std::size_t expected) noexcept {
 
 std::optional<std::int64_t> PropertyValue::wide_to_int64() const noexcept {
   if (!is_node(word_) || kind() != PropertyKind::integer) return std::nullopt;
-  const auto* node = static_cast<const NumberNode*>(node_of(word_));
-  if ((node->flags & kUnsigned) != 0) return std::nullopt;
-  return static_cast<std::int64_t>(node->bits);
+  const BytesNode& number = *bytes_of(word_);
+  if (number.length > 8) return std::nullopt;
+  return static_cast<std::int64_t>(bits_of(number));
 }
 
 std::optional<std::uint64_t> PropertyValue::to_uint64() const noexcept {
   if (kind() != PropertyKind::integer) return std::nullopt;
-  if (is_node(word_) && (node_of(word_)->flags & kUnsigned) != 0) {
-    return static_cast<const NumberNode*>(node_of(word_))->bits;
-  }
+  if (is_node(word_) && bytes_of(word_)->length > 8) return bits_of(*bytes_of(word_));
   const std::int64_t value = *to_int64();
   if (value < 0) return std::nullopt;
   return static_cast<std::uint64_t>(value);
@@ -108,7 +112,7 @@ std::optional<std::uint64_t> PropertyValue::to_uint64() const noexcept {
 
 double PropertyValue::to_double() const noexcept {
   if (kind() != PropertyKind::real && kind() != PropertyKind::date) return 0;
-  return std::bit_cast<double>(static_cast<const NumberNode*>(node_of(word_))->bits);
+  return std::bit_cast<double>(bits_of(*bytes_of(word_)));
 }
 
 std::span<const std::byte> PropertyValue::bytes() const noexcept {

@@ -180,7 +180,7 @@ template <std::size_t Size>
 class alignas(8) StaticText : detail::BytesNode {
  public:
   consteval StaticText(const char (&text)[Size])  // NOLINT(google-explicit-constructor): reads as the text it is
-      : BytesNode{{0, PropertyKind::string, detail::kStatic | detail::kAscii, 0}, Size - 1} {
+      : BytesNode{{0, PropertyKind::string, detail::kStatic | detail::kVerbatim, 0}, Size - 1} {
     for (std::size_t i = 0; i < Size; ++i) {
       if (static_cast<unsigned char>(text[i]) > 0x7f) detail::refuse_to_compile("a static text is ASCII");
       text_[i] = text[i];
@@ -193,7 +193,7 @@ class alignas(8) StaticText : detail::BytesNode {
   [[nodiscard]] constexpr const char* c_str() const noexcept { return text_; }
 
  private:
-  char text_[Size < 12 ? 12 : Size] = {};
+  char text_[Size < 20 ? 20 : Size] = {};
 };
 
 }  // namespace quorvel
