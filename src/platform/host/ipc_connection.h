@@ -61,6 +61,7 @@ class IpcConnection : public host::ListLink {
   /// The worker's notes.
   Stage stage = Stage::fresh;
   bool input_ended = false;
+  bool has_called = false;
   std::uint32_t interest = 0;
   std::int64_t since = 0;
   ByteBuffer input;

@@ -1,11 +1,13 @@
 #include "platform/host/ipc_worker.h"
 
+#include <sched.h>
 #include <sys/eventfd.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <utility>
 
 #include "platform/host/connection_limit.h"
 #include "platform/host/ipc_listener.h"
@@ -19,6 +21,9 @@ namespace {
 // How long a client may take over a call from its first byte, and over taking a whole reply.
 constexpr std::int64_t kCallMilliseconds = 10'000;
 constexpr std::int64_t kReplyMilliseconds = 30'000;
+
+// How long a thread stays awake for the next call of a client that called before.
+constexpr std::int64_t kAwakeMicroseconds = 50;
 
 constexpr int kEventsAtOnce = 64;
 
@@ -42,7 +47,7 @@ bool IpcWorker::prepare(IpcListener& listener) noexcept {
 }
 
 bool IpcWorker::start() noexcept {
-  errno = start_thread(thread_, "ipc", run_thread, this);
+  errno = start_thread(thread_, run_thread, this);
   started_ = errno == 0;
   return started_;
 }
@@ -56,6 +61,7 @@ void IpcWorker::stop() noexcept {
 }
 
 void* IpcWorker::run_thread(void* worker) noexcept {
+  name_this_thread("ipc");
   static_cast<IpcWorker*>(worker)->run();
   return nullptr;
 }
@@ -64,7 +70,7 @@ void IpcWorker::run() noexcept {
   epoll_event events[kEventsAtOnce];
   listen();
   while (!stopping_.load(std::memory_order_acquire)) {
-    const int count = ::epoll_wait(epoll_.get(), events, kEventsAtOnce, wait_limit());
+    const int count = wait_for_events(events);
     now_ = monotonic_milliseconds();
     for (int i = 0; i < count; ++i) handle(events[i]);
     serve_ready();
@@ -72,6 +78,22 @@ void IpcWorker::run() noexcept {
     free_closed();
     if (listen_again_ != 0 && now_ >= listen_again_) listen();
   }
+}
+
+// Waking a thread can take longer than a whole call: a client that calls again and again is awaited for a moment
+// without going to sleep, while everybody else may run.
+int IpcWorker::wait_for_events(std::span<epoll_event> events) noexcept {
+  const auto wait = [&](int milliseconds) {
+    return ::epoll_wait(epoll_.get(), events.data(), static_cast<int>(events.size()), milliseconds);
+  };
+  if (std::exchange(expects_call_, false)) {
+    const std::int64_t end = monotonic_microseconds() + kAwakeMicroseconds;
+    do {
+      if (const int count = wait(0); count != 0) return count;
+      ::sched_yield();
+    } while (monotonic_microseconds() < end);
+  }
+  return wait(wait_limit());
 }
 
 void IpcWorker::handle(const epoll_event& event) noexcept {
@@ -142,6 +164,7 @@ void IpcWorker::take_turn(IpcConnection& connection, std::span<const std::byte> 
   std::size_t used = 0;
   if (result == wire::FrameResult::complete) {
     if (frame.head.kind != wire::FrameKind::call) return close(connection);
+    expects_call_ |= std::exchange(connection.has_called, true);
     connection.run_call(frame, outgoing_);
     if (connection.is_broken()) return close(connection);
     used = wire::kFrameHeadSize + frame.head.body_length;

@@ -46,6 +46,7 @@ class IpcWorker {
 
   static void* run_thread(void* worker) noexcept;
   void run() noexcept;
+  [[nodiscard]] int wait_for_events(std::span<epoll_event> events) noexcept;
   void handle(const epoll_event& event) noexcept;
   [[nodiscard]] int wait_limit() const noexcept;
 
@@ -89,6 +90,7 @@ class IpcWorker {
   std::atomic<std::size_t> count_ = 0;
 
   // The thread's own.
+  bool expects_call_ = false;  // soon, from a client that called more than once
   std::int64_t now_ = 0;
   std::int64_t listen_again_ = 0;  // when a resting listener is listened to again; 0 while it is listened to
   ConnectionList lists_[static_cast<std::size_t>(Stage::closed) + 1];

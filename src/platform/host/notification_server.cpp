@@ -28,7 +28,7 @@ bool NotificationServer::start() noexcept {
   wake_ = Descriptor(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
   if (epoll_ && wake_ && watch(wake_.get(), EPOLLIN, &wake_, EPOLL_CTL_ADD) &&
       watch(socket_.get(), EPOLLIN, &socket_, EPOLL_CTL_ADD)) {
-    errno = start_thread(thread_, "notifications", run_thread, this);
+    errno = start_thread(thread_, run_thread, this);
     if (errno == 0) {
       running_.store(true, std::memory_order_release);
       return true;
@@ -54,6 +54,7 @@ void NotificationServer::post(ByteBuffer frame) noexcept {
 }
 
 void* NotificationServer::run_thread(void* server) noexcept {
+  name_this_thread("notifications");
   static_cast<NotificationServer*>(server)->run();
   return nullptr;
 }

@@ -11,14 +11,13 @@ constexpr std::size_t kStackSize = 1u << 20;
 
 }  // namespace
 
-int start_thread(pthread_t& thread, const char* name, void* (*run)(void*), void* argument) noexcept {
+int start_thread(pthread_t& thread, void* (*run)(void*), void* argument) noexcept {
   pthread_attr_t attributes;
   int error = ::pthread_attr_init(&attributes);
   if (error != 0) return error;
   ::pthread_attr_setstacksize(&attributes, kStackSize);
   error = ::pthread_create(&thread, &attributes, run, argument);
   ::pthread_attr_destroy(&attributes);
-  if (error == 0) ::pthread_setname_np(thread, name);
   return error;
 }
 
