@@ -3,7 +3,10 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
+#include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <limits>
 
 #include "platform/property/limits.h"
 #include "platform/property/unicode.h"
@@ -44,11 +47,16 @@ void put_escape(std::string_view bytes, TextSink& sink) noexcept {
 
 bool is_plain(char byte) noexcept { return byte >= 0x20 && byte < 0x7f; }
 
+// With fifteen digits, or as many more as tell the number from its neighbours. std::to_chars brings 150 KiB of code
+// and tables into the daemon, for something that is seldom seen.
 void describe_real(double number, TextSink& sink) noexcept {
   if (std::isnan(number)) return sink.put("nan");
   char text[32];
-  const auto end = std::to_chars(text, text + sizeof text, number).ptr;
-  const std::string_view digits(text, static_cast<std::size_t>(end - text));
+  int length = 0, precision = std::numeric_limits<double>::digits10;
+  do {
+    length = std::snprintf(text, sizeof text, "%.*g", precision, number);
+  } while (std::strtod(text, nullptr) != number && ++precision <= std::numeric_limits<double>::max_digits10);
+  const std::string_view digits(text, static_cast<std::size_t>(length));
   sink.put(digits);
   if (digits.find_first_of(".einf") == std::string_view::npos) sink.put(".0");
 }

@@ -99,6 +99,8 @@ TEST(Description, IsOneLineThatAReaderUnderstands) {
       {PropertyValue::real(2), "2.0"},
       {PropertyValue::real(-0.1), "-0.1"},
       {PropertyValue::real(1e300), "1e+300"},
+      {PropertyValue::real(0.1 + 0.2), "0.30000000000000004"},
+      {PropertyValue::real(5e-324), "4.94065645841247e-324"},
       {PropertyValue::date(0), "2001-01-01T00:00:00Z"},
       {PropertyValue::date(-978'307'200), "1970-01-01T00:00:00Z"},
       {PropertyValue::date(99'792'000.25), "2004-03-01T00:00:00.250Z"},
