@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "platform/property/binary_layout.h"
+#include "platform/property/leaf_reader.h"
 #include "platform/property/limits.h"
 #include "platform/property/short_text.h"
 #include "platform/property/unicode.h"
@@ -23,16 +24,9 @@ std::string_view text_of(const EncodedObject& object) noexcept {
   return {reinterpret_cast<const char*>(object.body), object.size};
 }
 
-// A chunk can always be read, as a file does not end with an object.
-bool is_ascii_text(const EncodedObject& object) noexcept {
-  if (object.size > kShortText) return is_ascii(text_of(object));
-  const Chunk all = gather_chunks(object.body, object.size, [](std::size_t, const Chunk&) {});
-  return high_bits(all, object.size) == 0;
-}
-
 bool is_valid_leaf(const EncodedObject& object) noexcept {
   switch (object.kind) {
-    case format::kAsciiText: return is_ascii_text(object);
+    case format::kAsciiText: return is_ascii(text_of(object));
     case format::kUtf16Text: return utf8_length_of_utf16(object.body, object.size) != SIZE_MAX;
     case format::kInteger: return object.size < 16 || fits_64_bits(object);
     default: return true;
@@ -51,19 +45,35 @@ class Checker {
     depths_ = static_cast<std::uint16_t*>(std::calloc(layout_.count(), sizeof(std::uint16_t)));
     if (depths_ == nullptr) return false;
     depths_[0] = 1;
-    std::uint64_t end = 0;
-    for (std::uint64_t i = 0; i < layout_.count(); ++i) {
+    std::uint64_t i = 0, end = format::kHeader.size();
+    for (; check_short_leaves(i, end) && i < layout_.count(); ++i) {
       const std::uint64_t offset = layout_.offset_of(i);
       EncodedObject object;
       if (offset < end || !layout_.object_at(offset, object)) return false;
       end = layout_.offset_at(object.end);
       if (!(object.is_container() ? check_container(i, object) : is_valid_leaf(object))) return false;
     }
+    if (i < layout_.count()) return false;
     EncodedObject top;
     return layout_.object_at(layout_.offset_of(0), top) && top.kind == format::kDictionary;
   }
 
  private:
+  // Moves `number` to the first object that is no short leaf, and `end` to where the one before it ends.
+  bool check_short_leaves(std::uint64_t& number, std::uint64_t& end) const noexcept {
+    const BinaryLayout layout = layout_;
+    const std::uint64_t limit = layout.limit_of(kLargestShortObject);
+    std::uint64_t foreign = 0;
+    for (; number < layout.count(); ++number) {
+      const std::uint64_t offset = layout.offset_of(number);
+      ShortLeaf leaf;
+      if (offset < end || offset >= limit || !find_short_leaf(layout.at(offset), leaf)) break;
+      foreign |= foreign_bits(leaf, gather_chunks(leaf.body, leaf.size, [](std::size_t, const Chunk&) {}));
+      end = layout.offset_at(leaf.body + leaf.size);
+    }
+    return foreign == 0;
+  }
+
   bool check_container(std::uint64_t number, const EncodedObject& object) noexcept {
     if (depths_[number] == 0 || depths_[number] > kMaximumDepth) return false;
     const std::byte* at = object.body;
@@ -76,14 +86,26 @@ class Checker {
 
   // Moves `at` behind the keys.
   bool check_keys(const EncodedObject& dictionary, const std::byte*& at) noexcept {
-    std::string_view before;
+    std::string_view before, key;
     for (std::uint64_t i = 0; i < dictionary.size; ++i, at += layout_.reference_size()) {
       const std::uint64_t reference = layout_.reference_at(at);
-      EncodedObject key;
-      if (reference >= layout_.count() || !layout_.object_at(layout_.offset_of(reference), key)) return false;
-      if (key.kind != format::kAsciiText || (i > 0 && !stands_before(before, text_of(key)))) return false;
-      before = text_of(key);
+      if (reference >= layout_.count() || !find_text(layout_.offset_of(reference), key)) return false;
+      if (i > 0 && !stands_before(before, key)) return false;
+      before = key;
     }
+    return true;
+  }
+
+  // The bytes of a text that is marked as ASCII.
+  bool find_text(std::uint64_t offset, std::string_view& text) const noexcept {
+    ShortLeaf leaf;
+    if (offset < layout_.limit_of(kLargestShortObject) && find_short_leaf(layout_.at(offset), leaf)) {
+      text = {reinterpret_cast<const char*>(leaf.body), leaf.size};
+      return offset >= format::kHeader.size() && leaf.marker.kind == PropertyKind::string;
+    }
+    EncodedObject object;
+    if (!layout_.object_at(offset, object) || object.kind != format::kAsciiText) return false;
+    text = text_of(object);
     return true;
   }
 

@@ -77,6 +77,11 @@ struct ShortLeaf {
 inline constexpr std::size_t kLargestShortObject = 3 + kShortText;
 inline constexpr std::ptrdiff_t kShortLeafRoom = kShortShapes[kShortText].room;
 
+/// Not 0 when `leaf` is a text with a byte above 0x7f, `all` being all its chunks together.
+[[nodiscard]] inline std::uint64_t foreign_bits(const ShortLeaf& leaf, Chunk all) noexcept {
+  return high_bits(all, leaf.size) & static_cast<std::uint64_t>(std::int64_t{leaf.marker.text_mask});
+}
+
 /// Makes a short leaf in a block that has room for it, and moves `room` behind it. Returns its word with its tags, or 0
 /// for a text that is none.
 inline Word make_short_leaf(const ShortLeaf& leaf, LeafAllocator::Room& room) noexcept {
@@ -88,7 +93,7 @@ inline Word make_short_leaf(const ShortLeaf& leaf, LeafAllocator::Room& room) no
   const Chunk all = gather_chunks(leaf.body, leaf.size, [to](std::size_t offset, const Chunk& chunk) {
     std::memcpy(to + offset, &chunk, sizeof chunk);
   });
-  if ((high_bits(all, leaf.size) & static_cast<std::uint64_t>(std::int64_t{marker.text_mask})) != 0) return 0;
+  if (foreign_bits(leaf, all) != 0) return 0;
   const std::uint64_t bits = binary_format::get_integer(leaf.body, 8) >> ((64 - 8 * leaf.size) & 63);
   const Word immediate_mask = static_cast<Word>(std::intptr_t{marker.immediate_mask});
   const Word immediate = (bits & static_cast<Word>(std::intptr_t{marker.value_mask})) << 3;
