@@ -15,7 +15,9 @@ bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, unsigned& cl
   if (key.has_key() && ark.class_marks.size() > 0) joined = ark.classes_of(key.domain_text()) & ~classes;
   if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
   classes |= joined;
-  if (ark.values.add(key.hashed(), std::move(value))) return true;
+  // A marked key has its text in memory once.
+  PropertyValue shared = classes != 0 ? ark.class_marks.key_of(key.hashed()) : PropertyValue{};
+  if (ark.values.add(key.hashed(), std::move(shared), std::move(value))) return true;
   if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
 }

@@ -32,7 +32,7 @@ class DataArk {
   // A dictionary from store key to value; none until the file is loaded or the first value is set.
   PropertyValue values QUORVEL_GUARDED_BY(lock);
   // The nine key classes: a dictionary from store key to a mask of the classes it belongs to, so that one look-up
-  // answers for all of them; none until the first mark.
+  // answers for all of them; none until the first mark. Shares the texts of its keys with `values`.
   PropertyValue class_marks QUORVEL_GUARDED_BY(lock);
   // Dictionaries from store key to notification name; none until their first registration.
   std::array<PropertyValue, kRegistryCount> registries QUORVEL_GUARDED_BY(lock);

@@ -7,7 +7,12 @@ bool DataArk::add_to_classes(const HashedKey& key, unsigned classes) noexcept {
   const unsigned before = classes_of(key);
   if ((classes & ~before) == 0) return true;
   if (!class_marks) class_marks = PropertyValue::dictionary();
-  return class_marks.set(key, PropertyValue::integer(before | classes));
+  PropertyValue marks = PropertyValue::integer(before | classes);
+  if (PropertyValue* slot = class_marks.slot(key)) {
+    *slot = std::move(marks);
+    return true;
+  }
+  return class_marks.add(key, values.key_of(key), std::move(marks));
 }
 
 void DataArk::remove_from_classes(const HashedKey& key, unsigned classes) noexcept {

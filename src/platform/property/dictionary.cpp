@@ -238,6 +238,12 @@ const PropertyValue& PropertyValue::get(const HashedKey& key) const noexcept {
   return entry == nullptr ? kNone : borrowed(entry->value);
 }
 
+const PropertyValue& PropertyValue::key_of(const HashedKey& key) const noexcept {
+  if (!is_dictionary()) return kNone;
+  const Entry* entry = find_entry(dictionary_at(word_), key);
+  return entry == nullptr ? kNone : borrowed(entry->key);
+}
+
 DictionaryRange PropertyValue::entries() const noexcept {
   if (!is_dictionary()) return {nullptr, nullptr};
   const DictionaryNode& dictionary = dictionary_at(word_);
@@ -267,11 +273,15 @@ bool PropertyValue::set(const HashedKey& key, PropertyValue value) noexcept {
 }
 
 bool PropertyValue::add(const HashedKey& key, PropertyValue value) noexcept {
+  return add(key, nullptr, std::move(value));
+}
+
+bool PropertyValue::add(const HashedKey& key, PropertyValue shared, PropertyValue value) noexcept {
   if (!value || !make_unique(PropertyKind::dictionary)) return false;
   DictionaryNode& dictionary = dictionary_of(word_);
-  PropertyValue key_value = joined_string(key.text, {});
-  if (!key_value || !make_room(dictionary)) return false;
-  add_entry(dictionary, key, key_value.take(), value.take());
+  if (!shared) shared = joined_string(key.text, {});
+  if (!shared || !make_room(dictionary)) return false;
+  add_entry(dictionary, key, shared.take(), value.take());
   return true;
 }
 

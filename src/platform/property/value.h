@@ -87,6 +87,8 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] const PropertyValue& at(std::size_t index) const noexcept;
   /// The value under `key` of a dictionary, borrowed; no value when there is none.
   [[nodiscard]] const PropertyValue& get(const HashedKey& key) const noexcept;
+  /// The key that an entry of a dictionary is held under, equal to `key`, borrowed; no value when there is no entry.
+  [[nodiscard]] const PropertyValue& key_of(const HashedKey& key) const noexcept;
   /// The entries of a dictionary in their order: that of the file it came from, then as they were added.
   [[nodiscard]] DictionaryRange entries() const noexcept;
 
@@ -96,6 +98,8 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] bool set(const HashedKey& key, PropertyValue value) noexcept;
   /// Adds an entry under a key that is known not to be there; false as for `set`. The key's text must be valid UTF-8.
   [[nodiscard]] bool add(const HashedKey& key, PropertyValue value) noexcept;
+  /// The same with `shared`, a string equal to `key` that others hold as well, as the entry's key; none to make one.
+  [[nodiscard]] bool add(const HashedKey& key, PropertyValue shared, PropertyValue value) noexcept;
   /// Takes the entry out and returns its value; none when there was none, this is no mutable dictionary, or the copy
   /// that a shared dictionary needs first could not be made.
   PropertyValue remove(const HashedKey& key) noexcept;
