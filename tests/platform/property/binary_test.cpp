@@ -49,6 +49,15 @@ std::string file_of(std::initializer_list<std::string_view> objects) {
   return file + bytes("0000000000000000 00000000000000") + table_offset;
 }
 
+// The object as the first value of a dictionary, far from the end of the file.
+std::string file_with(std::string_view object) {
+  return file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", object,
+                  "4f 10 34 'What stands far from the end is read in another way.'"});
+}
+PropertyValue dictionary_with(const PropertyValue& value) {
+  return dictionary({{"a", value}, {"b", data("What stands far from the end is read in another way.")}});
+}
+
 TEST(Binary, WritesTheKnownBytes) {
   const struct {
     Value value;
@@ -76,6 +85,7 @@ TEST(Binary, WritesTheKnownBytes) {
   for (const auto& [value, objects] : cases) {
     EXPECT_EQ(encoded(value.value()), file_of({objects})) << objects;
     EXPECT_EQ(decoded(file_of({objects})), value.value()) << objects;
+    EXPECT_EQ(decoded(file_with(objects)), dictionary_with(value.value())) << objects;
   }
   const PropertyValue nested = dictionary({{"b", array({"a", "b", true, true})}, {"a", 1}});
   EXPECT_EQ(encoded(nested), file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", "10 01", "a4 01 02 05 05", "09"}));
@@ -96,13 +106,21 @@ TEST(Binary, RefusesWhatIsNoPropertyList) {
       "00;0f;0a;15 00;24 00;30;34;71 00;80 00;90;b0;c0;e0;f0;14 0000000000000001 0000000000000000;"
       "14 ffffffffffffffff 0000000000000000;51 80;5f;5f 50;5f 13 ffffffffffffffff;"
       "5f 14 00000000000000000000000000000001;5f 10 ff;4f 13 7fffffffffffffff;61 d800;61 dc00;62 dc00 d800;"
-      "62 d800 0041;62 0041;a1 00;a1 01;d1 00 00;af 13 2000000000000000;df 13 7fffffffffffffff;23 00000000;33 00");
+      "62 d800 0041;62 0041;a1 00;a1 05;d1 00 00;af 13 2000000000000000;df 13 7fffffffffffffff;23 00000000;33 00");
   for (std::string object; std::getline(single_objects, object, ';');)
-    EXPECT_FALSE(decoded(file_of({object}))) << object;
+    EXPECT_FALSE(decoded(file_of({object})) || decoded(file_with(object))) << object;
   EXPECT_FALSE(decoded(file_of({"a1 01", "a1 00"}))) << "a cycle";
   EXPECT_FALSE(decoded(file_of({"d1 01 02", "10 01", "09"}))) << "a key that is no text";
   EXPECT_FALSE(decoded(file_of({"d2 01 02 03 03", "51 'a'", "51 'a'", "09"}))) << "a key twice";
   EXPECT_FALSE(decoded(file_of({"09"}) + "x"));
+  for (std::size_t length = 1; length <= 60; ++length) {
+    const std::string valid = encoded(dictionary_with(text(std::string(length, 'x'))));
+    for (std::size_t at = valid.find('x'); valid[at] == 'x'; ++at) {
+      std::string file = valid;
+      file[at] = '\x80';
+      EXPECT_FALSE(decoded(file)) << at << " of " << length;
+    }
+  }
   std::string long_text = encoded(text(std::string(5000, 'a')));
   long_text[4000] = '\x80';
   EXPECT_FALSE(decoded(long_text));
