@@ -8,15 +8,15 @@ namespace quorvel {
 namespace {
 
 // Adds an entry that is not there; it joins the classes of its domain, which are added to `classes`, those it is in
-// already. False, and nothing changed, when memory runs out.
-bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, unsigned& classes) noexcept
+// already. `shared` is its key where a mark holds it, so that a marked key has its text in memory once. False, and
+// nothing changed, when memory runs out.
+bool insert(DataArk& ark, const StoreKey& key, PropertyValue shared, PropertyValue value, unsigned& classes) noexcept
     QUORVEL_REQUIRES(ark.lock) {
   unsigned joined = 0;
   if (key.has_key() && ark.class_marks.size() > 0) joined = ark.classes_of(key.domain_text()) & ~classes;
   if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
   classes |= joined;
-  // A marked key has its text in memory once.
-  PropertyValue shared = classes != 0 ? ark.class_marks.key_of(key.hashed()) : PropertyValue{};
+  if (!shared && joined != 0) shared = ark.class_marks.find(key.hashed()).key;
   if (ark.values.add(key.hashed(), std::move(shared), std::move(value))) return true;
   if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
@@ -50,10 +50,12 @@ int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue&
   if (!ark->values) return -1;
   PropertyValue* const slot = ark->values.slot(store_key.hashed());
   const bool changed = slot == nullptr || !(*slot == value);
-  unsigned classes = changed ? ark->classes_of(store_key.hashed()) : 0;
+  const PropertyValue none;
+  const DictionaryEntry marks = changed ? ark->class_marks.find(store_key.hashed()) : DictionaryEntry{none, none};
+  unsigned classes = changed ? DataArk::classes_in(marks.value) : 0;
   if (slot != nullptr) {
     std::swap(*slot, stored);
-  } else if (!insert(*ark, store_key, std::move(stored), classes)) {
+  } else if (!insert(*ark, store_key, marks.key, std::move(stored), classes)) {
     if (is_first) ark->values = nullptr;
     return -1;
   }

@@ -41,7 +41,11 @@ class DataArk {
 
   /// The classes that a store key belongs to, as a mask of `class_bit`s.
   [[nodiscard]] unsigned classes_of(const HashedKey& key) const noexcept QUORVEL_REQUIRES(lock) {
-    return static_cast<unsigned>(class_marks.get(key).to_int64().value_or(0));
+    return classes_in(class_marks.get(key));
+  }
+  /// The classes that a value of `class_marks` tells.
+  [[nodiscard]] static unsigned classes_in(const PropertyValue& marks) noexcept {
+    return static_cast<unsigned>(marks.to_int64().value_or(0));
   }
   /// Marks a store key with classes it does not belong to yet. False when memory runs out.
   [[nodiscard]] bool add_to_classes(const HashedKey& key, unsigned classes) noexcept QUORVEL_REQUIRES(lock);

@@ -12,7 +12,7 @@ bool DataArk::add_to_classes(const HashedKey& key, unsigned classes) noexcept {
     *slot = std::move(marks);
     return true;
   }
-  return class_marks.add(key, values.key_of(key), std::move(marks));
+  return class_marks.add(key, values.find(key).key, std::move(marks));
 }
 
 void DataArk::remove_from_classes(const HashedKey& key, unsigned classes) noexcept {

@@ -238,10 +238,10 @@ const PropertyValue& PropertyValue::get(const HashedKey& key) const noexcept {
   return entry == nullptr ? kNone : borrowed(entry->value);
 }
 
-const PropertyValue& PropertyValue::key_of(const HashedKey& key) const noexcept {
-  if (!is_dictionary()) return kNone;
-  const Entry* entry = find_entry(dictionary_at(word_), key);
-  return entry == nullptr ? kNone : borrowed(entry->key);
+DictionaryEntry PropertyValue::find(const HashedKey& key) const noexcept {
+  const Entry* entry = is_dictionary() ? find_entry(dictionary_at(word_), key) : nullptr;
+  if (entry == nullptr) return {kNone, kNone};
+  return {borrowed(entry->key), borrowed(entry->value)};
 }
 
 DictionaryRange PropertyValue::entries() const noexcept {

@@ -25,6 +25,7 @@
 namespace quorvel {
 
 class DictionaryRange;
+struct DictionaryEntry;
 
 class [[nodiscard]] PropertyValue {
  public:
@@ -87,8 +88,8 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] const PropertyValue& at(std::size_t index) const noexcept;
   /// The value under `key` of a dictionary, borrowed; no value when there is none.
   [[nodiscard]] const PropertyValue& get(const HashedKey& key) const noexcept;
-  /// The key that an entry of a dictionary is held under, equal to `key`, borrowed; no value when there is no entry.
-  [[nodiscard]] const PropertyValue& key_of(const HashedKey& key) const noexcept;
+  /// The entry under `key` of a dictionary, borrowed; two times no value when there is none.
+  [[nodiscard]] DictionaryEntry find(const HashedKey& key) const noexcept;
   /// The entries of a dictionary in their order: that of the file it came from, then as they were added.
   [[nodiscard]] DictionaryRange entries() const noexcept;
 
