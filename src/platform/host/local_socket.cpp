@@ -84,7 +84,7 @@ Descriptor connect_local(std::string_view name) noexcept {
   }
   const Descriptor file(open_file(path, O_PATH, 0));
   LocalAddress address;
-  if (!file || !make_address(file.get(), {}, address)) return Descriptor();
+  if (!file || !make_address(file.get(), "", address)) return Descriptor();
   Descriptor socket = make_socket();
   if (!socket) return socket;
   int result = ::connect(socket.get(), address.get(), address.length);
