@@ -86,14 +86,15 @@ int IpcWorker::wait_for_events(std::span<epoll_event> events) noexcept {
   const auto wait = [&](int milliseconds) {
     return ::epoll_wait(epoll_.get(), events.data(), static_cast<int>(events.size()), milliseconds);
   };
-  if (std::exchange(expects_call_, false)) {
+  const int limit = wait_limit();
+  if (std::exchange(expects_call_, false) && limit != 0) {
     const std::int64_t end = monotonic_microseconds() + kAwakeMicroseconds;
     do {
       if (const int count = wait(0); count != 0) return count;
       ::sched_yield();
     } while (monotonic_microseconds() < end);
   }
-  return wait(wait_limit());
+  return wait(limit);
 }
 
 void IpcWorker::handle(const epoll_event& event) noexcept {

@@ -102,8 +102,9 @@ class BinaryLayout {
   std::size_t unit_sizes_[5] = {0, 1, 2, 0, 0};  // by Marker::Unit, in bytes
 };
 
-// Done for every object of a file. Whether a size is long is hard to predict, so that the common form of a long one, a
-// single byte behind an integer's marker, is read without a branch; behind the objects there are more than two bytes.
+// Done for containers and whatever else is no short leaf. Whether a size is long is hard to predict, so that the common
+// form of a long one, a single byte behind an integer's marker, is read without a branch; behind the objects there are
+// more than two bytes.
 inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object) const noexcept {
   const std::byte* at = marker_at(offset);
   if (at == nullptr) return false;
