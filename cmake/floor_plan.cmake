@@ -6,7 +6,7 @@ if(NOT PLAN)
   set(PLAN ${TREE}/docs/architecture.md)
 endif()
 set(linux_headers "^(linux/|asm/|sys/(epoll|eventfd|signalfd|timerfd|inotify|fanotify|pidfd|prctl|sendfile|syscall)\\.h)")
-set(linux_folders "^(src/platform/host|client|tools)(/|$)")
+set(linux_folders "^(src/linux|client|tools)(/|$)")
 set(include_roots src . client/include tools)  # beside the including file's own folder
 
 # Sets `folders` to the table's first column, and `may_include_<folder>` for each.
@@ -72,7 +72,7 @@ function(check_file file)
     if(include MATCHES "include[ \t]*\"")
       check_project_include(${folder} ${file} ${header})
     elseif(header MATCHES "${linux_headers}" AND NOT folder MATCHES "${linux_folders}")
-      message(SEND_ERROR "${file}: <${header}>: Linux headers belong to src/platform/host")
+      message(SEND_ERROR "${file}: <${header}>: Linux headers belong to src/linux")
     endif()
   endforeach()
 endfunction()

@@ -1,8 +1,8 @@
-#include "platform/wire/frame.h"
+#include "wire/frame.h"
 
 #include <algorithm>
 
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 #include "target.h"
 
 namespace quorvel::fuzz {

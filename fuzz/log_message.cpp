@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "log/message.h"
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 #include "target.h"
 
 namespace quorvel::fuzz {

@@ -1,4 +1,4 @@
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 #include "target.h"
 
 void quorvel::fuzz::run_once(Bytes input) {

@@ -4,13 +4,13 @@
 
 #include <filesystem>
 
-#include "platform/host/local_socket.h"
-#include "platform/host/telephony_answers.h"
-#include "platform/host/telephony_stream.h"
-#include "platform/wire/service_path.h"
-#include "platform/wire/telephony_state.h"
+#include "linux/base/local_socket.h"
+#include "linux/telephony/telephony_stream.h"
 #include "support/values.h"
 #include "target.h"
+#include "wire/service_path.h"
+#include "wire/telephony_answers.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::fuzz {
 namespace {
@@ -37,10 +37,10 @@ class Service {
 };
 
 void ask_everything(const wire::Frame& frame) {
-  const PropertyValue state = platform::host::state_of(frame);
+  const PropertyValue state = wire::state_of(frame);
   for (const std::string_view field : wire::kStateFields) {
     PropertyValue value;
-    platform::host::take_answer(state, field, value);
+    wire::take_answer(state, field, value);
     const char* fault = value ? test::round_trip_fault(value) : nullptr;
     require(fault == nullptr, fault);
   }

@@ -5,7 +5,7 @@
 
 #include "bench/support/measurements.h"
 #include "bench/support/property_values.h"
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 
 namespace quorvel::bench {
 

@@ -13,7 +13,7 @@
 
 #include "bench/processes/local_socket.h"
 #include "bench/support/files.h"
-#include "platform/property/binary_format.h"
+#include "property/binary/binary_format.h"
 
 namespace quorvel::bench {
 namespace {

@@ -8,10 +8,10 @@
 #include "bench/processes/service.h"
 #include "bench/support/files.h"
 #include "bench/support/scratch_root.h"
-#include "platform/property/binary_format.h"
-#include "platform/wire/frame.h"
-#include "platform/wire/service_path.h"
+#include "property/binary/binary_format.h"
 #include "protocol/quorvel_protocol.h"
+#include "wire/frame.h"
+#include "wire/service_path.h"
 
 namespace quorvel::bench {
 namespace {

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "bench/data_set.h"
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::bench {
 

@@ -5,8 +5,8 @@
 #include <optional>
 #include <string>
 
-#include "platform/wire/frame.h"
 #include "service_socket.h"
+#include "wire/frame.h"
 
 namespace quorvel::client {
 

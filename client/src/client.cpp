@@ -3,9 +3,9 @@
 #include <system_error>
 
 #include "channel.h"
-#include "platform/property/binary.h"
-#include "platform/wire/service_path.h"
+#include "property/binary/binary.h"
 #include "protocol/quorvel_protocol.h"
+#include "wire/service_path.h"
 
 namespace quorvel::client {
 namespace {

@@ -1,8 +1,8 @@
 #include "quorvel/observer.h"
 
 #include "channel.h"
-#include "platform/property/binary.h"
-#include "platform/wire/service_path.h"
+#include "property/binary/binary.h"
+#include "wire/service_path.h"
 
 namespace quorvel::client {
 namespace {

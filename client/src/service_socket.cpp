@@ -14,7 +14,7 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "platform/wire/service_path.h"
+#include "wire/service_path.h"
 
 namespace quorvel::client {
 namespace {

@@ -1,7 +1,7 @@
 // One run of the telephony facts collector, for either kind of baseband. Main thread only.
 #pragma once
 
-#include "platform/property/value.h"
+#include "property/value.h"
 #include "store/data_ark.h"
 
 namespace quorvel {

@@ -11,8 +11,8 @@
 #include "platform/descriptor.h"
 #include "platform/flush_file.h"
 #include "platform/lock.h"
-#include "platform/property/binary.h"
-#include "platform/property/encoded.h"
+#include "property/binary/binary.h"
+#include "property/binary/encoded.h"
 
 namespace quorvel {
 namespace {

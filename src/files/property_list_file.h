@@ -1,7 +1,7 @@
 // Property-list files, read and written whole through the safe open. Any thread may call everything here.
 #pragma once
 
-#include "platform/property/omitted_entries.h"
+#include "property/binary/omitted_entries.h"
 
 namespace quorvel {
 

@@ -3,7 +3,7 @@
 
 #include <cstddef>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel {
 

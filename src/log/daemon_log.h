@@ -20,7 +20,7 @@
 #include <string_view>
 #include <type_traits>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel {
 

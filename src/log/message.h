@@ -4,7 +4,7 @@
 #include <span>
 
 #include "log/daemon_log.h"
-#include "platform/property/description.h"
+#include "property/description.h"
 
 namespace quorvel {
 

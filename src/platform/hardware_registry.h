@@ -4,7 +4,7 @@
 #include <string_view>
 
 #include "platform/descriptor.h"
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::platform {
 

@@ -6,7 +6,7 @@
 #include <span>
 #include <string_view>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::platform {
 

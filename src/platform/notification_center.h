@@ -1,6 +1,6 @@
 #pragma once
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::platform {
 

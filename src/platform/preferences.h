@@ -3,7 +3,7 @@
 
 #include <string_view>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::platform {
 

@@ -4,8 +4,8 @@
 
 #include <cstdint>
 
-#include "platform/property/value.h"
 #include "platform/run_loop.h"
+#include "property/value.h"
 
 namespace quorvel::platform {
 

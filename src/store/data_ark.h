@@ -7,7 +7,7 @@
 
 #include <cstdint>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel {
 

@@ -5,7 +5,7 @@
 #include <cstdint>
 
 #include "platform/lock.h"
-#include "platform/property/value.h"
+#include "property/value.h"
 #include "store/store_key.h"
 
 namespace quorvel {

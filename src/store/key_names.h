@@ -1,7 +1,7 @@
 // The names of keys and domains of the data ark, each written once for everybody who uses it.
 #pragma once
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::keys {
 

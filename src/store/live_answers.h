@@ -1,7 +1,7 @@
 // Which questions the device-information service is asked for the keys that it answers.
 #pragma once
 
-#include "platform/property/value.h"
+#include "property/value.h"
 #include "store/live_answer_table.h"
 
 namespace quorvel {

@@ -3,7 +3,7 @@
 
 #include <cstdlib>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel {
 

@@ -4,12 +4,12 @@
 #include "device/device_type.h"
 #include "device/telephony_facts.h"
 #include "platform/process.h"
-#include "platform/wire/telephony_state.h"
 #include "quorvel/client.h"
 #include "quorvel/observer.h"
 #include "store/standard_key_classes.h"
 #include "support/program.h"
 #include "support/scratch_root.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::test {
 

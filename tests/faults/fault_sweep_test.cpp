@@ -5,9 +5,9 @@
 
 #include "faults/daemon_under_faults.h"
 #include "platform/telephony.h"
-#include "platform/wire/telephony_state.h"
 #include "quorvel/observer.h"
 #include "support/socket_peer.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::test {
 namespace {

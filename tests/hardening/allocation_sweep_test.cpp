@@ -11,17 +11,17 @@
 #include "files/property_list_file.h"
 #include "files/value_helpers.h"
 #include "hardening/allocations.h"
+#include "linux/notifications/notification_server.h"
 #include "log/daemon_log.h"
-#include "platform/host/notification_server.h"
-#include "platform/property/binary.h"
 #include "platform/telephony.h"
-#include "platform/wire/telephony_state.h"
+#include "property/binary/binary.h"
 #include "protocol/quorvel_protocol.h"
 #include "store/data_ark_record.h"
 #include "store/key_names.h"
 #include "store/live_answers.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::test {
 

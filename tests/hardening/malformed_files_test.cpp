@@ -4,7 +4,7 @@
 #include <iostream>
 
 #include "hardening/allocations.h"
-#include "platform/property/limits.h"
+#include "property/limits.h"
 #include "support/values.h"
 
 namespace quorvel::test {

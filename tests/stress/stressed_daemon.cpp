@@ -4,8 +4,8 @@
 
 #include <fstream>
 
-#include "platform/wire/service_path.h"
 #include "protocol/quorvel_protocol.h"
+#include "wire/service_path.h"
 
 namespace quorvel::test {
 namespace {

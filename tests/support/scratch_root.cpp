@@ -2,7 +2,7 @@
 
 #include <fstream>
 
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 
 namespace quorvel::test {
 namespace {

@@ -4,8 +4,8 @@
 #include <sys/socket.h>
 #include <sys/un.h>
 
-#include "platform/host/local_socket.h"
-#include "platform/property/binary.h"
+#include "linux/base/local_socket.h"
+#include "property/binary/binary.h"
 
 namespace quorvel::test {
 

@@ -2,8 +2,8 @@
 #pragma once
 
 #include "platform/descriptor.h"
-#include "platform/wire/frame.h"
 #include "support/watching.h"
+#include "wire/frame.h"
 
 namespace quorvel::test {
 

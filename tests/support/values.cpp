@@ -2,8 +2,8 @@
 
 #include <ostream>
 
-#include "platform/property/byte_buffer.h"
-#include "platform/property/description.h"
+#include "property/byte_buffer.h"
+#include "property/description.h"
 
 namespace quorvel {
 namespace test {

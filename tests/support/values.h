@@ -4,8 +4,8 @@
 //   EXPECT_EQ(root.read_plist("/some/file.plist"), expected);
 #pragma once
 
-#include "platform/property/binary.h"
-#include "platform/property/value.h"
+#include "property/binary/binary.h"
+#include "property/value.h"
 #include "support/prelude.h"
 
 namespace quorvel {

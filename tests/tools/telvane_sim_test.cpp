@@ -2,11 +2,11 @@
 #include <sys/socket.h>
 
 #include "platform/telephony.h"
-#include "platform/wire/telephony_state.h"
 #include "quorvel/client.h"
 #include "support/program.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::test {
 

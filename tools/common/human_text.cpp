@@ -6,7 +6,7 @@
 #include <cstdlib>
 #include <vector>
 
-#include "platform/property/description.h"
+#include "property/description.h"
 
 namespace quorvel::tools {
 namespace {

@@ -4,7 +4,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::tools {
 

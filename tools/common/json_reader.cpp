@@ -8,7 +8,7 @@
 #include "date_text.h"
 #include "json.h"
 #include "json_forms.h"
-#include "platform/property/limits.h"
+#include "property/limits.h"
 
 namespace quorvel::tools {
 namespace {

@@ -10,7 +10,7 @@
 #include "common/failure.h"
 #include "platform/descriptor.h"
 #include "platform/file_system.h"
-#include "platform/property/binary.h"
+#include "property/binary/binary.h"
 
 namespace quorvel::tools {
 namespace {

@@ -4,7 +4,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::tools {
 

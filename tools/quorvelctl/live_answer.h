@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::tools {
 

@@ -8,7 +8,7 @@
 #include "common/telephony_names.h"
 #include "common/words.h"
 #include "output.h"
-#include "platform/wire/telephony_state.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::tools {
 namespace {

@@ -10,8 +10,8 @@
 #include "common/root_option.h"
 #include "platform/file_system.h"
 #include "platform/process.h"
-#include "platform/wire/service_path.h"
 #include "server.h"
+#include "wire/service_path.h"
 
 namespace quorvel::tools {
 namespace {

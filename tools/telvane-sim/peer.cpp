@@ -4,7 +4,7 @@
 
 #include <cerrno>
 
-#include "platform/wire/telephony_state.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::tools {
 namespace {

@@ -8,8 +8,8 @@
 #include <string>
 
 #include "platform/descriptor.h"
-#include "platform/wire/frame.h"
 #include "sim_state.h"
+#include "wire/frame.h"
 
 namespace quorvel::tools {
 

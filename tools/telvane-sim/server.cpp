@@ -7,9 +7,9 @@
 #include <cerrno>
 
 #include "common/telephony_names.h"
-#include "platform/property/binary.h"
-#include "platform/wire/failure.h"
-#include "platform/wire/telephony_state.h"
+#include "property/binary/binary.h"
+#include "wire/failure.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::tools {
 namespace {

@@ -6,8 +6,8 @@
 #include <list>
 #include <vector>
 
+#include "linux/base/local_socket.h"
 #include "peer.h"
-#include "platform/host/local_socket.h"
 #include "sim_state.h"
 
 namespace quorvel::tools {

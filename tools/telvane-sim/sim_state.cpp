@@ -5,8 +5,8 @@
 #include <iterator>
 #include <limits>
 
-#include "platform/wire/frame.h"
-#include "platform/wire/telephony_state.h"
+#include "wire/frame.h"
+#include "wire/telephony_state.h"
 
 namespace quorvel::tools {
 namespace {

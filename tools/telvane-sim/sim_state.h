@@ -6,8 +6,8 @@
 #include <string>
 #include <string_view>
 
-#include "platform/property/byte_buffer.h"
-#include "platform/property/value.h"
+#include "property/byte_buffer.h"
+#include "property/value.h"
 
 namespace quorvel::tools {
 

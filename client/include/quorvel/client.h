@@ -15,7 +15,7 @@
 #include <string_view>
 #include <thread>
 
-#include "platform/property/value.h"
+#include "property/value.h"
 
 namespace quorvel::client {
 

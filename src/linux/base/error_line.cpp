@@ -1,0 +1,72 @@
+#include "linux/base/error_line.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdarg>
+#include <cstddef>
+#include <cstdio>
+#include <cstring>
+
+namespace quorvel::platform::host {
+
+namespace {
+
+// A line is built in place, cut where it is full.
+class ErrorLine {
+ public:
+  ErrorLine() noexcept { append("quorveld: "); }
+
+  [[gnu::format(printf, 2, 3)]] void append(const char* format, ...) noexcept {
+    std::va_list arguments;
+    va_start(arguments, format);
+    append_list(format, arguments);
+    va_end(arguments);
+  }
+
+  void append_list(const char* format, std::va_list arguments) noexcept {
+    const int wanted = std::vsnprintf(text_ + length_, sizeof text_ - length_, format, arguments);
+    length_ = std::min(length_ + static_cast<std::size_t>(std::max(wanted, 0)), sizeof text_ - 1);
+  }
+
+  void write() noexcept {
+    const auto is_control = [](char c) { return static_cast<unsigned char>(c) < ' ' || c == 0x7f; };
+    std::replace_if(text_, text_ + length_, is_control, '?');
+    text_[length_] = '\n';
+    // A line that cannot be written has nowhere else to go.
+    [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, text_, length_ + 1);
+  }
+
+ private:
+  char text_[1024];
+  std::size_t length_ = 0;
+};
+
+}  // namespace
+
+void print_error_line(const char* format, ...) noexcept {
+  const int error = errno;
+  ErrorLine line;
+  std::va_list arguments;
+  va_start(arguments, format);
+  line.append_list(format, arguments);
+  va_end(arguments);
+  line.write();
+  errno = error;
+}
+
+void print_system_error(const char* format, ...) noexcept {
+  const int error = errno;
+  ErrorLine line;
+  std::va_list arguments;
+  va_start(arguments, format);
+  line.append_list(format, arguments);
+  va_end(arguments);
+  char text[128];
+  line.append(": %s", ::strerror_r(error, text, sizeof text));
+  line.write();
+  errno = error;
+}
+
+}  // namespace quorvel::platform::host

@@ -1,0 +1,84 @@
+// One client of the IPC service. A connection belongs to one worker, whose thread alone uses it once it serves it.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+
+#include "linux/base/intrusive_list.h"
+#include "platform/descriptor.h"
+#include "platform/ipc.h"
+#include "property/byte_buffer.h"
+#include "wire/frame.h"
+#include "wire/shared_bytes.h"
+#include "wire/waiting_replies.h"
+
+namespace quorvel::platform {
+
+namespace host {
+/// The longest body of a call.
+inline constexpr std::uint32_t kMaximumCallBody = 64u << 10;
+
+/// What a connection borrows from its worker while a call of it runs.
+struct IpcOutgoing {
+  ByteBuffer frame;
+  wire::WaitingReplies* waiting = nullptr;
+};
+}  // namespace host
+
+class IpcConnection : public host::ListLink {
+ public:
+  /// What the worker waits for; each stage has a list of its own, in the order of `since`.
+  enum class Stage : std::uint8_t {
+    fresh,    // the first byte of its first call
+    idle,     // the first byte of a call
+    partial,  // the rest of a call
+    ready,    // its turn: a whole call is there
+    sending,  // the client to take the rest of a reply
+    closed    // the end of the batch of events that it was closed in
+  };
+
+  explicit IpcConnection(Descriptor socket) noexcept : socket_(std::move(socket)) {}
+
+  [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
+  void close() noexcept { socket_ = Descriptor(); }
+
+  void set_interface(const IpcInterface* interface) noexcept { interface_ = interface; }
+  void set_object(void* object) noexcept { object_ = object; }
+  void set_resumed() noexcept { resumed_ = true; }
+  [[nodiscard]] bool is_resumed() const noexcept { return resumed_; }
+
+  /// Runs the call that `frame` holds and sends its reply as far as the socket takes it.
+  void run_call(const wire::Frame& frame, host::IpcOutgoing& outgoing) noexcept;
+  /// Sends a reply from within `run_call`.
+  void reply(std::uint64_t serial, const PropertyValue& value, const IpcError* error) noexcept;
+  /// Sends more of the reply that waits.
+  void continue_sending() noexcept;
+  [[nodiscard]] bool has_waiting_reply() const noexcept { return static_cast<bool>(waiting_); }
+  /// True when the connection cannot go on: the client is gone, or memory did not suffice.
+  [[nodiscard]] bool is_broken() const noexcept { return broken_; }
+
+  /// The worker's notes.
+  Stage stage = Stage::fresh;
+  bool input_ended = false;
+  bool has_called = false;
+  std::uint32_t interest = 0;
+  std::int64_t since = 0;
+  ByteBuffer input;
+
+ private:
+  void transmit(ByteBuffer& frame) noexcept;
+
+  Descriptor socket_;
+  const IpcInterface* interface_ = nullptr;
+  void* object_ = nullptr;
+  bool resumed_ = false;
+  bool broken_ = false;
+  host::IpcOutgoing* outgoing_ = nullptr;
+  // The reply that waits: its own head, and a frame whose other bytes it may share with other connections.
+  std::byte head_[wire::kFrameHeadSize];
+  wire::SharedBytes waiting_;
+  std::size_t sent_ = 0;
+};
+
+}  // namespace quorvel::platform

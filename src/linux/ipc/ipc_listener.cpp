@@ -1,0 +1,99 @@
+#include "linux/ipc/ipc_listener.h"
+
+#include <sched.h>
+#include <sysexits.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <new>
+
+#include "linux/base/error_line.h"
+#include "linux/process/service_manager.h"
+#include "wire/service_path.h"
+
+namespace quorvel::platform {
+
+namespace {
+
+[[nodiscard]] std::size_t hardware_threads() noexcept {
+  cpu_set_t set;
+  if (::sched_getaffinity(0, sizeof set, &set) != 0) return 0;
+  return static_cast<std::size_t>(CPU_COUNT(&set));
+}
+
+}  // namespace
+
+bool IpcListener::set_service_name(std::string_view name) noexcept {
+  const int length = std::snprintf(socket_name_, sizeof socket_name_, "%.*s%s", static_cast<int>(name.size()),
+                                   name.data(), wire::kSocketSuffix.data());
+  return length >= 0 && static_cast<std::size_t>(length) < sizeof socket_name_;
+}
+
+int IpcListener::open_socket() noexcept {
+  if (Descriptor passed = host::take_passed_socket()) {
+    socket_ = host::ListeningSocket(std::move(passed));
+    return 0;
+  }
+  socket_ = host::ListeningSocket::open(socket_name_);
+  if (socket_) return 0;
+  if (errno == EADDRINUSE) {
+    host::print_error_line("another process serves %s", socket_name_);
+    return EX_UNAVAILABLE;
+  }
+  host::print_system_error("cannot listen on %s/%s", wire::kServiceDirectory.data(), socket_name_);
+  return EX_OSERR;
+}
+
+int IpcListener::start_workers() noexcept {
+  worker_count_ = std::clamp(hardware_threads(), kMinimumWorkers, kMaximumWorkers);
+  bool working = true;
+  for (std::size_t i = 0; working && i < worker_count_; ++i) working = workers_[i].prepare(*this);
+  for (std::size_t i = 0; working && i < worker_count_; ++i) working = workers_[i].start();
+  if (working) return 0;
+  host::print_system_error("cannot start the threads of the IPC service");
+  return EX_OSERR;
+}
+
+int IpcListener::start() noexcept {
+  const int status = open_socket();
+  return status != 0 ? status : start_workers();
+}
+
+void IpcListener::stop() noexcept {
+  socket_.remove_file();
+  for (host::IpcWorker& worker : workers_) worker.stop();
+}
+
+bool IpcListener::accepts(IpcConnection& connection) noexcept {
+  return delegate_.accept != nullptr && delegate_.accept(delegate_.object, this, &connection) &&
+         connection.is_resumed();
+}
+
+std::size_t IpcListener::connection_count() const noexcept {
+  std::size_t count = 0;
+  for (std::size_t i = 0; i < worker_count_; ++i) count += workers_[i].connection_count();
+  return count;
+}
+
+host::IpcWorker& IpcListener::least_loaded() noexcept {
+  return *std::min_element(workers_, workers_ + worker_count_,
+                           [](const host::IpcWorker& left, const host::IpcWorker& right) {
+                             return left.connection_count() < right.connection_count();
+                           });
+}
+
+IpcListener* create_listener(std::string_view service_name) noexcept {
+  IpcListener* listener = new (std::nothrow) IpcListener;
+  if (listener != nullptr && listener->set_service_name(service_name)) return listener;
+  delete listener;
+  return nullptr;
+}
+
+void set_delegate(IpcListener* listener, IpcDelegate delegate) noexcept { listener->set_delegate(delegate); }
+
+int resume(IpcListener* listener) noexcept { return listener->start(); }
+
+void release_listener(IpcListener* listener) noexcept { delete listener; }
+
+}  // namespace quorvel::platform

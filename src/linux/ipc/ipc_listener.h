@@ -1,0 +1,49 @@
+// A listener of the IPC service with its socket and its workers.
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+#include "linux/base/local_socket.h"
+#include "linux/ipc/ipc_worker.h"
+#include "platform/ipc.h"
+#include "wire/waiting_replies.h"
+
+namespace quorvel::platform {
+
+class IpcListener {
+ public:
+  IpcListener() noexcept = default;
+  IpcListener(const IpcListener&) = delete;
+  IpcListener& operator=(const IpcListener&) = delete;
+  ~IpcListener() { stop(); }
+
+  [[nodiscard]] bool set_service_name(std::string_view name) noexcept;
+  void set_delegate(IpcDelegate delegate) noexcept { delegate_ = delegate; }
+  /// `resume` of the platform's interface.
+  [[nodiscard]] int start() noexcept;
+
+  /// For the workers, on their threads.
+  [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
+  [[nodiscard]] wire::WaitingReplies& waiting_replies() noexcept { return waiting_replies_; }
+  [[nodiscard]] bool accepts(IpcConnection& connection) noexcept;
+  [[nodiscard]] std::size_t connection_count() const noexcept;
+  [[nodiscard]] host::IpcWorker& least_loaded() noexcept;
+
+ private:
+  static constexpr std::size_t kMinimumWorkers = 2;
+  static constexpr std::size_t kMaximumWorkers = 4;
+
+  [[nodiscard]] int open_socket() noexcept;
+  [[nodiscard]] int start_workers() noexcept;
+  void stop() noexcept;
+
+  char socket_name_[108] = {};
+  IpcDelegate delegate_ = {};
+  host::ListeningSocket socket_;
+  wire::WaitingReplies waiting_replies_;
+  std::size_t worker_count_ = 0;  // settled before the first worker starts
+  host::IpcWorker workers_[kMaximumWorkers];
+};
+
+}  // namespace quorvel::platform

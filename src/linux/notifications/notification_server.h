@@ -1,0 +1,73 @@
+// The notification center's socket and thread. Whoever connects receives each notification from then on.
+#pragma once
+
+#include <pthread.h>
+#include <sys/epoll.h>
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+
+#include "linux/base/local_socket.h"
+#include "linux/notifications/notification_observer.h"
+#include "platform/descriptor.h"
+#include "wire/notification_ring.h"
+
+namespace quorvel::platform::host {
+
+class NotificationServer {
+ public:
+  NotificationServer() noexcept = default;
+  NotificationServer(const NotificationServer&) = delete;
+  NotificationServer& operator=(const NotificationServer&) = delete;
+  ~NotificationServer() { stop(); }
+
+  /// Opens the socket and starts the thread. False with errno set. Main thread, as is `stop`.
+  [[nodiscard]] bool start() noexcept;
+  /// Sends what observers can take at once, stops the thread and takes the socket away.
+  void stop() noexcept;
+
+  /// Passes an encoded notification on, or, where it is empty, that one could not be encoded. Never waits. Any thread.
+  void post(ByteBuffer frame) noexcept;
+  /// False when nobody can be connected. Any thread.
+  [[nodiscard]] bool is_running() const noexcept { return running_.load(std::memory_order_acquire); }
+
+ private:
+  using Progress = NotificationObserver::Progress;
+
+  static void* run_thread(void* server) noexcept;
+  [[nodiscard]] bool watch(int descriptor, std::uint32_t events, void* who, int operation) noexcept;
+  void run() noexcept;
+  void handle(const epoll_event& event) noexcept;
+  void serve_news() noexcept;
+  void serve(NotificationObserver& observer) noexcept;
+  void remove(NotificationObserver& observer) noexcept;
+  void forget_served() noexcept;
+  void accept_all() noexcept;
+  [[nodiscard]] bool take_in(Descriptor socket) noexcept;
+  void listen() noexcept;
+  void rest() noexcept;
+
+  ListeningSocket socket_;
+  Descriptor epoll_;
+  Descriptor wake_;
+  pthread_t thread_ = {};
+  std::atomic<bool> running_ = false;
+  std::atomic<bool> stopping_ = false;
+  std::atomic<bool> woken_ = false;  // a wake-up is on its way that will see everything posted so far
+  wire::NotificationRing ring_;
+
+  // The thread's own.
+  IntrusiveList<NotificationObserver> observers_;
+  std::size_t observer_count_ = 0;
+  std::uint64_t served_ = 0;       // what was newest when observers were last accepted
+  std::int64_t listen_again_ = 0;  // when a resting listener is listened to again; 0 while it is listened to
+};
+
+/// The process's one server. Lives until the process ends.
+[[nodiscard]] NotificationServer& notification_server() noexcept;
+
+/// Starts it, or says on standard error why there are no observers, and has it stopped at the process's orderly end.
+void start_notification_server() noexcept;
+
+}  // namespace quorvel::platform::host

@@ -1,0 +1,59 @@
+#include "linux/process/instance_lock.h"
+
+#include <sys/file.h>
+#include <sysexits.h>
+
+#include <cerrno>
+
+#include "linux/base/error_line.h"
+#include "platform/descriptor.h"
+#include "platform/file_system.h"
+
+namespace quorvel::platform::host {
+
+namespace {
+
+constexpr char kLockPath[] = "/run/quorvel/quorveld.lock";
+
+[[nodiscard]] bool make_service_directory() noexcept {
+  for (const char* path : {"/run", "/run/quorvel"}) {
+    if (make_directory(path, 0755) == 0 || errno == EEXIST) continue;
+    print_system_error("cannot make the directory %s", path);
+    return false;
+  }
+  return true;
+}
+
+// Nobody else may open the file: whoever can open it could hold the lock.
+[[nodiscard]] Descriptor open_lock_file() noexcept {
+  Descriptor file(open_file(kLockPath, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0600));
+  struct stat status;
+  if (file && ::fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode)) return file;
+  if (file) errno = EINVAL;
+  return Descriptor();
+}
+
+}  // namespace
+
+int take_instance_lock() noexcept {
+  if (!make_service_directory()) return EX_OSERR;
+  Descriptor file = open_lock_file();
+  if (!file) {
+    print_system_error("cannot open the lock file %s", kLockPath);
+    return EX_OSERR;
+  }
+  int result = ::flock(file.get(), LOCK_EX | LOCK_NB);
+  while (result != 0 && errno == EINTR) result = ::flock(file.get(), LOCK_EX | LOCK_NB);
+  if (result == 0) {
+    static_cast<void>(file.take());
+    return 0;
+  }
+  if (errno == EWOULDBLOCK) {
+    print_error_line("another quorveld is running (it holds %s)", kLockPath);
+    return EX_UNAVAILABLE;
+  }
+  print_system_error("cannot lock %s", kLockPath);
+  return EX_OSERR;
+}
+
+}  // namespace quorvel::platform::host

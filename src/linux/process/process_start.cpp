@@ -1,0 +1,109 @@
+#include <fcntl.h>
+#include <malloc.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sysexits.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <csignal>
+#include <cstdio>
+
+#include "linux/base/device_root.h"
+#include "linux/base/error_line.h"
+#include "linux/base/local_socket.h"
+#include "linux/notifications/notification_server.h"
+#include "linux/process/instance_lock.h"
+#include "linux/process/run_loop_source.h"
+#include "linux/process/service_manager.h"
+#include "platform/process.h"
+#include "wire/service_path.h"
+
+namespace quorvel::platform {
+
+namespace {
+
+constexpr rlim_t kMaximumDescriptors = 65536;
+
+// A file that took the number of a closed standard descriptor would receive what is meant for that.
+[[nodiscard]] bool fill_standard_descriptors() noexcept {
+  int descriptor = -1;
+  do {
+    descriptor = ::open("/dev/null", O_RDWR);
+    if (descriptor < 0) return false;
+  } while (descriptor <= STDERR_FILENO);
+  ::close(descriptor);
+  return true;
+}
+
+// A peer that goes away and a file that reaches its size limit are errors to be handled, not reasons to die.
+void ignore_fatal_signals() noexcept {
+  struct sigaction ignore = {};
+  ignore.sa_handler = SIG_IGN;
+  ::sigaction(SIGPIPE, &ignore, nullptr);
+  ::sigaction(SIGXFSZ, &ignore, nullptr);
+}
+
+void raise_descriptor_limit() noexcept {
+  rlimit limit;
+  if (::getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+  const rlim_t wanted = std::min(limit.rlim_max, kMaximumDescriptors);
+  if (limit.rlim_cur >= wanted) return;
+  limit.rlim_cur = wanted;
+  ::setrlimit(RLIMIT_NOFILE, &limit);
+}
+
+// A large file or reply takes its memory back to the system with it. The allocator would otherwise learn from the first
+// one to keep such memory, in every thread.
+void bound_idle_memory() noexcept {
+  ::mallopt(M_MMAP_THRESHOLD, 512 << 10);
+  ::mallopt(M_TRIM_THRESHOLD, 1 << 20);
+}
+
+// Somebody may hold the service's socket without the lock. A socket that the service manager passed is live, and ours.
+[[nodiscard]] int refuse_served_socket(std::string_view service_name) noexcept {
+  if (service_name.empty() || host::has_passed_socket()) return 0;
+  char name[NAME_MAX + 1];
+  const int length = std::snprintf(name, sizeof name, "%.*s%s", static_cast<int>(service_name.size()),
+                                   service_name.data(), wire::kSocketSuffix.data());
+  if (length < 0 || !host::is_served(name)) return 0;
+  host::print_error_line("another process serves %s", name);
+  return EX_UNAVAILABLE;
+}
+
+}  // namespace
+
+int start_process(std::string_view service_name) noexcept {
+  if (!fill_standard_descriptors()) {
+    host::print_system_error("cannot open /dev/null");
+    return EX_OSERR;
+  }
+  const host::DeviceRoot& root = host::device_root();
+  if (root.error != 0) {
+    errno = root.error;
+    host::print_system_error("QUORVEL_ROOT must be the absolute path of a directory");
+    return EX_CONFIG;
+  }
+  ignore_fatal_signals();
+  ::umask(022);
+  raise_descriptor_limit();
+  bound_idle_memory();
+  if (!main_run_loop()->open()) {
+    host::print_system_error("cannot make the run loop");
+    return EX_OSERR;
+  }
+  // The socket is asked about first: the lock of another user's instance cannot even be opened.
+  int status = refuse_served_socket(service_name);
+  if (status == 0) status = host::take_instance_lock();
+  if (status == 0) host::start_notification_server();
+  return status;
+}
+
+void end_process(const char* reason, int status) noexcept {
+  host::print_error_line("%s", reason);
+  ::_exit(status);
+}
+
+}  // namespace quorvel::platform

@@ -1,0 +1,100 @@
+#include "linux/process/service_manager.h"
+
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <sys/time.h>
+#include <sys/un.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <cstddef>
+#include <cstdlib>
+#include <cstring>
+#include <string_view>
+
+#include "linux/base/error_line.h"
+#include "platform/process.h"
+
+namespace quorvel::platform {
+
+namespace {
+
+constexpr int kFirstPassedDescriptor = 3;
+constexpr int kMaximumPassedDescriptors = 1024;
+
+// The number in an environment variable, or 0.
+[[nodiscard]] int environment_number(const char* name) noexcept {
+  const char* value = std::getenv(name);
+  if (value == nullptr) return 0;
+  const char* end = value + std::strlen(value);
+  int number = 0;
+  const auto [stop, error] = std::from_chars(value, end, number);
+  return error == std::errc() && stop == end ? number : 0;
+}
+
+[[nodiscard]] bool has_socket_option(int descriptor, int option, int expected) noexcept {
+  int value = 0;
+  socklen_t length = sizeof value;
+  return ::getsockopt(descriptor, SOL_SOCKET, option, &value, &length) == 0 && value == expected;
+}
+
+// The first passed descriptor that clients can be accepted from, or -1.
+[[nodiscard]] int find_passed_socket() noexcept {
+  if (environment_number("LISTEN_PID") != ::getpid()) return -1;
+  const int count = std::clamp(environment_number("LISTEN_FDS"), 0, kMaximumPassedDescriptors);
+  for (int descriptor = kFirstPassedDescriptor; descriptor < kFirstPassedDescriptor + count; ++descriptor) {
+    if (has_socket_option(descriptor, SO_DOMAIN, AF_UNIX) && has_socket_option(descriptor, SO_TYPE, SOCK_STREAM) &&
+        has_socket_option(descriptor, SO_ACCEPTCONN, 1)) {
+      return descriptor;
+    }
+  }
+  return -1;
+}
+
+[[nodiscard]] bool send_to_manager(std::string_view socket_name, std::string_view message) noexcept {
+  sockaddr_un address = {};
+  address.sun_family = AF_UNIX;
+  if (socket_name.size() < 2 || socket_name.size() >= sizeof address.sun_path) {
+    errno = EINVAL;
+    return false;
+  }
+  std::memcpy(address.sun_path, socket_name.data(), socket_name.size());
+  // An abstract name starts with a zero byte and ends where the address does.
+  const bool is_abstract = socket_name.front() == '@';
+  if (is_abstract) address.sun_path[0] = '\0';
+  const auto length =
+      static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + socket_name.size() + (is_abstract ? 0 : 1));
+  const Descriptor socket(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+  if (!socket) return false;
+  // A manager that is behind with its messages gets a moment, because it waits for this one.
+  const timeval patience = {1, 0};
+  ::setsockopt(socket.get(), SOL_SOCKET, SO_SNDTIMEO, &patience, sizeof patience);
+  ssize_t sent = -1;
+  do {
+    sent = ::sendto(socket.get(), message.data(), message.size(), MSG_NOSIGNAL,
+                    reinterpret_cast<const sockaddr*>(&address), length);
+  } while (sent < 0 && errno == EINTR);
+  return sent >= 0;
+}
+
+}  // namespace
+
+bool host::has_passed_socket() noexcept { return find_passed_socket() >= 0; }
+
+Descriptor host::take_passed_socket() noexcept {
+  const int descriptor = find_passed_socket();
+  if (descriptor < 0) return Descriptor();
+  ::fcntl(descriptor, F_SETFD, FD_CLOEXEC);
+  const int flags = ::fcntl(descriptor, F_GETFL);
+  if (flags < 0 || ::fcntl(descriptor, F_SETFL, flags | O_NONBLOCK) != 0) return Descriptor();
+  return Descriptor(descriptor);
+}
+
+void report_ready() noexcept {
+  const char* name = std::getenv("NOTIFY_SOCKET");
+  if (name == nullptr || name[0] == '\0') return;
+  if (!send_to_manager(name, "READY=1")) host::print_system_error("cannot tell the service manager at %s", name);
+}
+
+}  // namespace quorvel::platform

@@ -1,0 +1,58 @@
+// The telephony service's notification center: the last state that the service pushed, and who observes it.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "linux/process/run_loop_source.h"
+#include "linux/telephony/telephony_stream.h"
+#include "platform/descriptor.h"
+#include "platform/telephony.h"
+
+namespace quorvel::platform {
+
+class TelephonyCenter {
+ public:
+  TelephonyCenter() noexcept = default;
+  TelephonyCenter(const TelephonyCenter&) = delete;
+  TelephonyCenter& operator=(const TelephonyCenter&) = delete;
+
+  /// Connects for the first time. False when the service is not there.
+  [[nodiscard]] bool start() noexcept;
+  void bind(RunLoop* loop) noexcept;
+  [[nodiscard]] bool add_observer(void* context, TelephonyObserver observer, const PropertyValue& name) noexcept;
+
+  /// The last state received, a dictionary; none while the service is away.
+  [[nodiscard]] const PropertyValue& state() const noexcept { return state_; }
+
+ private:
+  struct Observer {
+    PropertyValue name;
+    void* context;
+    TelephonyObserver call;
+    Observer* next;
+  };
+
+  static void serve_stream(void* center) noexcept;
+  static void try_again(void* center) noexcept;
+  [[nodiscard]] bool handle(const wire::Frame& frame) noexcept;
+  void deliver(std::string_view name) noexcept;
+  void watch_stream() noexcept;
+  void lose_service() noexcept;
+  void schedule_try() noexcept;
+
+  host::TelephonyStream stream_;
+  Descriptor timer_;
+  RunLoopSource stream_source_;
+  RunLoopSource timer_source_;
+  RunLoop* loop_ = nullptr;
+  int delay_ = 0;  // milliseconds before the next attempt to connect
+  PropertyValue state_;
+  Observer* first_observer_ = nullptr;
+  Observer** last_link_ = &first_observer_;
+};
+
+/// The default center if it exists already. Borrowed, null otherwise. Main thread.
+[[nodiscard]] TelephonyCenter* existing_telephony_center() noexcept;
+
+}  // namespace quorvel::platform

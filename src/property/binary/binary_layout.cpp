@@ -1,0 +1,47 @@
+#include "property/binary/binary_layout.h"
+
+namespace quorvel::detail {
+
+namespace format = binary_format;
+
+bool BinaryLayout::parse(std::span<const std::byte> bytes) noexcept {
+  if (bytes.size() < format::kSmallestFile) return false;
+  if (std::memcmp(bytes.data(), format::kHeader.data(), format::kHeader.size()) != 0) return false;
+  const std::uint64_t trailer_offset = bytes.size() - format::kTrailerSize;
+  const std::byte* trailer = bytes.data() + trailer_offset;
+  start_ = bytes.data();
+  offset_size_ = static_cast<std::size_t>(trailer[format::kOffsetSizeAt]);
+  reference_size_ = static_cast<std::size_t>(trailer[format::kReferenceSizeAt]);
+  count_ = format::get_integer(trailer + format::kObjectCountAt, 8);
+  top_ = format::get_integer(trailer + format::kTopObjectAt, 8);
+  const std::uint64_t table = format::get_integer(trailer + format::kTableOffsetAt, 8);
+  const auto is_width = [](std::size_t width) { return width >= 1 && width <= 8; };
+  if (!is_width(offset_size_) || !is_width(reference_size_)) return false;
+  if (table <= format::kHeader.size() || table >= trailer_offset) return false;
+  if (count_ == 0 || count_ > (trailer_offset - table) / offset_size_) return false;
+  table_ = start_ + table;
+  unit_sizes_[Marker::kReference] = reference_size_;
+  unit_sizes_[Marker::kEntry] = 2 * reference_size_;
+  return top_ < count_;
+}
+
+// The size in an integer object of any width, which `object.body` is behind the marker of a single byte's.
+bool BinaryLayout::parse_long_size(EncodedObject& object) const noexcept {
+  const std::byte* at = object.body - 2;
+  if (at == table_) return false;
+  const auto integer = static_cast<std::uint8_t>(*at++);
+  if (integer >> 4 != format::kInteger || (integer & 15) > 3) return false;
+  const std::size_t width = std::size_t{1} << (integer & 15);
+  if (static_cast<std::size_t>(table_ - at) < width) return false;
+  object.size = format::get_integer(at, width);
+  object.body = at + width;
+  return object.size >> 63 == 0;
+}
+
+bool fits_64_bits(const EncodedObject& wide_integer) noexcept {
+  const std::uint64_t high = format::get_integer(wide_integer.body, 8);
+  const std::uint64_t low = format::get_integer(wide_integer.body + 8, 8);
+  return high == 0 || (high == UINT64_MAX && low >> 63 == 1);
+}
+
+}  // namespace quorvel::detail

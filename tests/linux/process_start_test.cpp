@@ -1,0 +1,160 @@
+// What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
+#include "linux/base/local_socket.h"
+#include "platform/notification_center.h"
+#include "platform/process.h"
+#include "support/scratch_root.h"
+#include "support/socket_peer.h"
+
+namespace quorvel::test {
+namespace {
+
+using testing::ExitedWithCode;
+
+constexpr const char* kService = "com.example.service";
+constexpr const char* kSocket = "com.example.service.sock";
+
+// Starts a process of its own, which ends with what `start_process` returned.
+#define EXPECT_START(status, line) \
+  EXPECT_EXIT(std::exit(platform::start_process(kService)), ExitedWithCode(status), line)
+
+TEST(ProcessStart, RefusesARootThatIsNoDirectory) {
+  ScratchRoot root;
+  root.write_file("/file", "");
+  for (const std::string& value :
+       {std::string(), std::string("relative"), root.path("/file").string(), root.path("/missing").string()}) {
+    ::setenv("QUORVEL_ROOT", value.c_str(), 1);
+    EXPECT_START(78, "^quorveld: QUORVEL_ROOT must be the absolute path of a directory: [^\n]*\n$") << value;
+  }
+}
+
+TEST(ProcessStart, SettlesWhatTheDaemonRestsOn) {
+  ScratchRoot root;
+  root.remove("/run");
+  const auto settled = [&] {
+    ::close(STDIN_FILENO);
+    if (platform::start_process(kService) != 0) return 1;
+    struct stat input;
+    if (::fstat(STDIN_FILENO, &input) != 0 || !S_ISCHR(input.st_mode)) return 2;
+    if (root.mode_of("/run/quorvel") != 0755 || root.mode_of("/run/quorvel/notifications.sock") != 0666) return 3;
+    if (::raise(SIGPIPE) != 0 || ::raise(SIGXFSZ) != 0 || ::raise(SIGTERM) != 0) return 4;
+    return 0;
+  };
+  EXPECT_EXIT(std::exit(settled()), ExitedWithCode(0), "^$");
+  EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
+}
+
+TEST(ProcessStart, RefusesASecondInstance) {
+  ScratchRoot root;
+  root.make_directory("/run/quorvel");
+  {
+    const Descriptor live = listen_on(kSocket);
+    EXPECT_START(69, "^quorveld: another process serves com.example.service.sock\n$");
+    EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
+  }
+  EXPECT_START(0, "^$") << "the socket is stale now";
+}
+
+TEST(ProcessStart, RefusesALockFileThatIsNone) {
+  ScratchRoot root;
+  root.make_fifo("/run/quorvel/quorveld.lock");
+  EXPECT_START(71, "^quorveld: cannot open the lock file [^\n]*\n$");
+  root.remove("/run/quorvel/quorveld.lock");
+  root.make_link("/decoy", "/run/quorvel/quorveld.lock");
+  EXPECT_START(71, "^quorveld: cannot open the lock file [^\n]*\n$");
+  EXPECT_FALSE(root.exists("/decoy"));
+}
+
+TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
+  using platform::host::ListeningSocket;
+  ScratchRoot root(std::string(150, 'l'));
+  root.write_file("/run/quorvel/a.sock", "kept");
+  EXPECT_FALSE(ListeningSocket::open("a.sock"));
+  EXPECT_EQ(errno, EEXIST);
+  EXPECT_EQ(root.read_file("/run/quorvel/a.sock"), "kept");
+  root.remove("/run/quorvel/a.sock");
+  static_cast<void>(listen_on("a.sock"));
+  {
+    const ListeningSocket socket = ListeningSocket::open("a.sock");
+    EXPECT_TRUE(socket);
+    EXPECT_EQ(root.mode_of("/run/quorvel/a.sock"), 0666u);
+    EXPECT_FALSE(ListeningSocket::open("a.sock"));
+    EXPECT_EQ(errno, EADDRINUSE);
+    // A link to a socket is taken inside the device root, as every path is.
+    root.make_link("/run/quorvel/a.sock", "/run/quorvel/inwards.sock");
+    root.make_link(root.path("/run/quorvel/a.sock").string(), "/run/quorvel/outwards.sock");
+    EXPECT_TRUE(platform::host::connect_local("inwards.sock"));
+    EXPECT_FALSE(platform::host::connect_local("outwards.sock"));
+  }
+  EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));
+  EXPECT_FALSE(ListeningSocket::open(std::string(100, 'n')));
+  EXPECT_EQ(errno, ENAMETOOLONG);
+}
+
+using platform::post_notification;
+using wire::FrameKind;
+
+class NotificationCenter : public testing::Test {
+ protected:
+  NotificationCenter() { EXPECT_EQ(platform::start_process(), 0); }
+
+  static SocketPeer observer() { return SocketPeer::connected_to("notifications.sock"); }
+
+  ScratchRoot root;
+};
+
+TEST_F(NotificationCenter, WhoeverIsConnectedBeforeAPostReceivesIt) {
+  const std::size_t open_before = descriptors_open();
+  for (std::int64_t i = 1; i <= 300; ++i) {
+    SocketPeer peer = observer();
+    post_notification(text("com.example.changed"), PropertyValue::integer(i));
+    const auto ready = peer.receive();
+    ASSERT_TRUE(ready);
+    ASSERT_EQ(ready->kind, FrameKind::ready);
+    std::uint64_t serial = ready->serial;
+    while (serial < static_cast<std::uint64_t>(i)) {
+      const auto notification = peer.receive();
+      ASSERT_TRUE(notification) << "notification " << i << " after ready " << ready->serial;
+      ASSERT_EQ(notification->kind, FrameKind::notification);
+      ASSERT_EQ(notification->serial, ++serial);
+      EXPECT_EQ(notification->name, "com.example.changed");
+      EXPECT_EQ(notification->value, PropertyValue::integer(static_cast<std::int64_t>(serial)));
+    }
+    ASSERT_LE(ready->serial, static_cast<std::uint64_t>(i - 1));
+  }
+  EXPECT_TRUE(eventually([&] { return descriptors_open() == open_before; }));
+}
+
+TEST_F(NotificationCenter, ASlowObserverIsToldHowManyItMissed) {
+  SocketPeer slow = observer();
+  SocketPeer rude = observer();
+  static_cast<void>(rude.send(std::string(50'000, '?')));
+  const PropertyValue object = text(std::string(1000, 'o'));
+  constexpr std::uint64_t count = 10'000;
+  for (std::uint64_t i = 1; i < count; ++i) {
+    // One that has no name on the wire counts like the others.
+    post_notification(i == count - 3 ? text("a\nb") : text("name"), object);
+  }
+  post_notification(text("last"), nullptr);
+  for (SocketPeer* peer : {&slow, &rude}) {
+    std::uint64_t serial = peer->receive()->serial;
+    std::uint64_t missed = 0;
+    while (serial < count) {
+      const auto frame = peer->receive();
+      ASSERT_TRUE(frame) << "after " << serial;
+      if (frame->kind == FrameKind::missed) {
+        missed += *frame->value.to_uint64();
+        serial += *frame->value.to_uint64();
+      } else {
+        ++serial;
+      }
+      ASSERT_EQ(frame->serial, serial);
+      EXPECT_EQ(frame->name == "last", serial == count);
+    }
+    EXPECT_GT(missed, 1000u);
+  }
+  SocketPeer late = observer();
+  EXPECT_EQ(late.receive()->serial, count);
+}
+
+}  // namespace
+}  // namespace quorvel::test

@@ -1,0 +1,248 @@
+#include "property/binary/binary.h"
+
+#include <cmath>
+
+#include "property/binary/encoded.h"
+#include "property/limits.h"
+#include "support/values.h"
+
+namespace quorvel::test {
+namespace {
+
+std::string bytes(std::string_view hex) {
+  std::string result;
+  for (std::size_t i = 0; i < hex.size(); ++i) {
+    if (hex[i] == ' ') continue;
+    if (hex[i] == '\'') {
+      for (++i; hex[i] != '\''; ++i) result += hex[i];
+      continue;
+    }
+    result += static_cast<char>(std::stoi(std::string(hex.substr(i, 2)), nullptr, 16));
+    ++i;
+  }
+  return result;
+}
+
+PropertyValue encoded_value(std::string_view file) {
+  ByteBuffer bytes;
+  EXPECT_TRUE(bytes.append(file));
+  return read_encoded(std::move(bytes));
+}
+
+// Both ways to read must agree on every file.
+PropertyValue decoded(std::string_view file, Mutability mutability = Mutability::immutable) {
+  PropertyValue value = read_binary(std::as_bytes(std::span(file)), mutability);
+  EXPECT_EQ(encoded_value(file), value);
+  return value;
+}
+
+// A file with one-byte widths around objects, the first of which is the top one.
+std::string file_of(std::initializer_list<std::string_view> objects) {
+  std::string file = "bplist00", table;
+  for (const auto object : objects) {
+    table += static_cast<char>(file.size());
+    file += bytes(object);
+  }
+  const auto table_offset = static_cast<char>(file.size());
+  file += table + bytes("0000000000 00 01 01 00000000000000");
+  file += static_cast<char>(objects.size());
+  return file + bytes("0000000000000000 00000000000000") + table_offset;
+}
+
+// The object as the first value of a dictionary, far from the end of the file.
+std::string file_with(std::string_view object) {
+  return file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", object,
+                  "4f 10 34 'What stands far from the end is read in another way.'"});
+}
+PropertyValue dictionary_with(const PropertyValue& value) {
+  return dictionary({{"a", value}, {"b", data("What stands far from the end is read in another way.")}});
+}
+
+TEST(Binary, WritesTheKnownBytes) {
+  const struct {
+    Value value;
+    std::string_view objects;
+  } cases[] = {
+      {false, "08"},
+      {true, "09"},
+      {0, "10 00"},
+      {255, "10 ff"},
+      {256, "11 0100"},
+      {65'536, "12 00010000"},
+      {4'294'967'296, "13 0000000100000000"},
+      {-1, "13 ffffffffffffffff"},
+      {std::numeric_limits<std::int64_t>::min(), "13 8000000000000000"},
+      {std::numeric_limits<std::uint64_t>::max(), "14 0000000000000000 ffffffffffffffff"},
+      {1.5, "23 3ff8000000000000"},
+      {PropertyValue::date(-0.5), "33 bfe0000000000000"},
+      {data("\x01\x02"), "42 0102"},
+      {"", "50"},
+      {"fifteen letters", "5f 10 0f 'fifteen letters'"},
+      {"\xc3\xa4\xf0\x9f\x98\x80", "63 00e4 d83d de00"},
+      {array({}), "a0"},
+      {dictionary({}), "d0"},
+  };
+  for (const auto& [value, objects] : cases) {
+    EXPECT_EQ(encoded(value.value()), file_of({objects})) << objects;
+    EXPECT_EQ(decoded(file_of({objects})), value.value()) << objects;
+    EXPECT_EQ(decoded(file_with(objects)), dictionary_with(value.value())) << objects;
+  }
+  const PropertyValue nested = dictionary({{"b", array({"a", "b", true, true})}, {"a", 1}});
+  EXPECT_EQ(encoded(nested), file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", "10 01", "a4 01 02 05 05", "09"}));
+}
+
+TEST(Binary, ReadsWhatOtherWritersMayChoose) {
+  // A 16-byte integer that fits eight, a four-byte real, ASCII in UTF-16, objects out of order, wide references.
+  EXPECT_EQ(decoded(file_of({"14 ffffffffffffffff ffffffffffffff00"})), PropertyValue::integer(-256));
+  EXPECT_EQ(decoded(file_of({"22 3fc00000"})), PropertyValue::real(1.5));
+  EXPECT_EQ(encoded(decoded(file_of({"62 0061 0062"}))), file_of({"52 'ab'"}));
+  EXPECT_EQ(decoded(bytes("'bplist00' 09 a1 0001 09 08 0000000000 00 01 02 0000000000000002 0000000000000000 "
+                          "000000000000000c")),
+            array({true}));
+}
+
+TEST(Binary, RefusesWhatIsNoPropertyList) {
+  std::istringstream single_objects(
+      "00;0f;0a;15 00;24 00;30;34;71 00;80 00;90;b0;c0;e0;f0;14 0000000000000001 0000000000000000;"
+      "14 ffffffffffffffff 0000000000000000;51 80;5f;5f 50;5f 13 ffffffffffffffff;"
+      "5f 14 00000000000000000000000000000001;5f 10 ff;4f 13 7fffffffffffffff;61 d800;61 dc00;62 dc00 d800;"
+      "62 d800 0041;62 0041;a1 00;a1 05;d1 00 00;af 13 2000000000000000;df 13 7fffffffffffffff;23 00000000;33 00");
+  for (std::string object; std::getline(single_objects, object, ';');)
+    EXPECT_FALSE(decoded(file_of({object})) || decoded(file_with(object))) << object;
+  EXPECT_FALSE(decoded(file_of({"a1 01", "a1 00"}))) << "a cycle";
+  EXPECT_FALSE(decoded(file_of({"d1 01 02", "10 01", "09"}))) << "a key that is no text";
+  EXPECT_FALSE(decoded(file_of({"d2 01 02 03 03", "51 'a'", "51 'a'", "09"}))) << "a key twice";
+  EXPECT_FALSE(decoded(file_of({"09"}) + "x"));
+  for (std::size_t length = 1; length <= 60; ++length) {
+    const std::string valid = encoded(dictionary_with(text(std::string(length, 'x'))));
+    for (std::size_t at = valid.find('x'); valid[at] == 'x'; ++at) {
+      std::string file = valid;
+      file[at] = '\x80';
+      EXPECT_FALSE(decoded(file)) << at << " of " << length;
+    }
+  }
+  std::string long_text = encoded(text(std::string(5000, 'a')));
+  long_text[4000] = '\x80';
+  EXPECT_FALSE(decoded(long_text));
+  EXPECT_FALSE(
+      decoded(bytes("'bplist00' 0000000000000000 5f 10 0000000000 00 01 01 0000000000000001 0000000000000000"
+                    "0000000000000011")))
+      << "a size that stands in the offset table";
+  const std::string valid = file_of({"a2 01 02", "51 'a'", "10 05"});
+  for (const int width : {0, 9, 255}) {
+    for (const std::size_t at : {26u, 25u}) {
+      std::string file = valid;
+      file[file.size() - at] = static_cast<char>(width);
+      EXPECT_FALSE(decoded(file)) << width;
+    }
+  }
+  std::string overlapping = valid;
+  overlapping[overlapping.size() - 32 - 1] = 9;  // object 2 begins within object 0
+  EXPECT_FALSE(decoded(overlapping));
+}
+
+TEST(Binary, EqualValuesGiveEqualBytes) {
+  PropertyValue up = PropertyValue::dictionary(), down = PropertyValue::dictionary();
+  for (int i = 0; i < 500; ++i) {
+    ASSERT_TRUE(up.set("key" + std::to_string(i), PropertyValue::integer(i)));
+    ASSERT_TRUE(down.set("key" + std::to_string(499 - i), PropertyValue::integer(499 - i)));
+    ASSERT_TRUE(down.set("gone" + std::to_string(i), PropertyValue::integer(i)));
+  }
+  for (int i = 0; i < 500; ++i) EXPECT_TRUE(down.remove("gone" + std::to_string(i)));
+  EXPECT_EQ(up, down);
+  EXPECT_EQ(encoded(up), encoded(down));
+  EXPECT_EQ(encoded(decoded(encoded(up))), encoded(up));
+}
+
+TEST(Binary, ReferencesAreAsSmallAsTheyCanBe) {
+  const auto flags = [](int entries) {
+    PropertyValue value = PropertyValue::dictionary();
+    for (int i = 0; i < entries; ++i) EXPECT_TRUE(value.set(std::to_string(i), PropertyValue::boolean(true)));
+    return value;
+  };
+  const auto numbers = [](int count) {
+    PropertyValue value = PropertyValue::array();
+    for (int i = 0; i < count; ++i) EXPECT_TRUE(value.append(PropertyValue::integer(i)));
+    return array({value});
+  };
+  const std::tuple<PropertyValue, int> cases[] = {{flags(254), 1},      {flags(255), 2},     {flags(40'000), 2},
+                                                  {flags(65'535), 4},   {numbers(254), 1},   {numbers(255), 2},
+                                                  {numbers(65'534), 2}, {numbers(65'535), 4}};
+  for (const auto& [value, size] : cases) {
+    const std::string file = encoded(value);
+    EXPECT_EQ(file[file.size() - 25], size);
+    EXPECT_EQ(decoded(file), value);
+  }
+}
+
+PropertyValue nested(std::size_t levels) {
+  PropertyValue value = PropertyValue::boolean(true);
+  for (std::size_t i = 0; i < levels; ++i) value = array({value});
+  return value;
+}
+
+TEST(Binary, BoundsHoldForReaderAndWriterAlike) {
+  ByteBuffer out;
+  EXPECT_TRUE(write_binary(nested(kMaximumDepth), out));
+  EXPECT_TRUE(read_binary(out.bytes(), Mutability::immutable));
+  const std::size_t size = out.size();
+  EXPECT_FALSE(write_binary(nested(kMaximumDepth + 1), out));
+  EXPECT_FALSE(write_binary(nested(1'000'000), out));
+  EXPECT_EQ(out.size(), size);
+
+  PropertyValue fan = array({true});
+  for (int i = 0; i < 30; ++i) fan = array({fan, fan});
+  EXPECT_FALSE(write_binary(fan, out));
+  PropertyValue other = array({true});
+  for (int i = 0; i < 30; ++i) other = array({other, other});
+  EXPECT_FALSE(fan == other) << "ends, without an answer it could not check";
+
+  PropertyValue wide = PropertyValue::array();
+  for (int i = 0; i < 1'500'000; ++i) ASSERT_TRUE(wide.append(PropertyValue::integer(i % 7)));
+  out.clear();
+  ASSERT_TRUE(write_binary(wide, out)) << "what stands there is no repetition";
+  EXPECT_EQ(read_binary(out.bytes(), Mutability::immutable), wide);
+}
+
+TEST(Binary, ADictionaryThatKeepsItsBytesBehavesLikeAnyOther) {
+  const PropertyValue expected = dictionary({{"a", array({1, "x"})}, {"b", dictionary({})}, {"c", 2.5}});
+  const std::string file = encoded(expected);
+  const PropertyValue value = encoded_value(file);
+  const PropertyValue copy = value;
+  const auto kept = encoded_bytes(copy);
+  EXPECT_EQ(std::string(reinterpret_cast<const char*>(kept.data()), kept.size()), file);
+  EXPECT_TRUE(encoded_bytes(expected).empty());
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&] {
+      EXPECT_EQ(value.get("a").size(), 2u);
+      EXPECT_EQ(value, expected);
+      EXPECT_EQ(encoded(value), file);
+    });
+  }
+  for (auto& thread : threads) thread.join();
+  EXPECT_FALSE(value.is_mutable());
+  PropertyValue open = value.mutable_copy();
+  ASSERT_TRUE(open.set("a", PropertyValue::boolean(true)));
+  EXPECT_EQ(value, expected);
+  EXPECT_TRUE(encoded_bytes(open).empty());
+}
+
+TEST(Binary, MutabilityIsThatOfTheRead) {
+  const std::string file = encoded(dictionary({{"inner", dictionary({{"list", array({1})}})}, {"text", "t"}}));
+  PropertyValue fixed = decoded(file), open = decoded(file, Mutability::mutable_containers);
+  EXPECT_FALSE(fixed.set("new", PropertyValue::boolean(true)));
+  EXPECT_FALSE(fixed.remove("text"));
+  EXPECT_EQ(fixed.slot("inner"), nullptr);
+  PropertyValue* inner = open.slot("inner");
+  ASSERT_NE(inner, nullptr);
+  PropertyValue* list = inner->slot("list");
+  ASSERT_NE(list, nullptr);
+  EXPECT_TRUE(list->append(PropertyValue::integer(2)));
+  EXPECT_TRUE(open.remove("text"));
+  EXPECT_EQ(open, dictionary({{"inner", dictionary({{"list", array({1, 2})}})}}));
+  EXPECT_EQ(fixed, decoded(file));
+}
+
+}  // namespace
+}  // namespace quorvel::test
