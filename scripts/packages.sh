@@ -25,3 +25,10 @@ ensure_packages() {
   "${as_root[@]}" apt-get update -qq >&2 &&
     "${as_root[@]}" env DEBIAN_FRONTEND=noninteractive apt-get install -y -qq --no-install-recommends "${missing[@]}" >&2
 }
+
+# Where this machine's apt takes Debian itself from, for roots of other releases.
+debian_mirror() {
+  local uri
+  uri=$(apt-get indextargets --format '$(REPO_URI)' 2>/dev/null | grep '/debian/*$' | head -n 1)
+  echo "${uri:-http://deb.debian.org/debian}"
+}
