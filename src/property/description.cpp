@@ -27,14 +27,6 @@ void put_byte(unsigned byte, TextSink& sink) noexcept {
   sink.put(std::string_view(digits, sizeof digits));
 }
 
-// True where a character would end, redraw or hide part of its line: C0 and C1 controls, line and paragraph separators.
-bool is_control(std::string_view character) noexcept {
-  const auto byte = [&](std::size_t i) { return static_cast<unsigned char>(character[i]); };
-  if (character.size() == 1) return byte(0) < 0x20 || byte(0) == 0x7f;
-  if (character.size() == 2) return byte(0) == 0xc2 && byte(1) < 0xa0;
-  return character.size() == 3 && byte(0) == 0xe2 && byte(1) == 0x80 && (byte(2) == 0xa8 || byte(2) == 0xa9);
-}
-
 void put_escape(std::string_view bytes, TextSink& sink) noexcept {
   if (bytes == "\n") return sink.put("\\n");
   if (bytes == "\t") return sink.put("\\t");
@@ -194,7 +186,7 @@ void TextSink::put_escaped(std::string_view text) noexcept {
     if (at == text.size()) return;
     const std::size_t length = utf8_character_length(text, at);
     const std::string_view character = text.substr(at, std::max<std::size_t>(length, 1));
-    if (length == 0 || is_control(character)) {
+    if (length == 0 || is_unsafe_to_display(character)) {
       put_escape(character, *this);
     } else {
       put(character);

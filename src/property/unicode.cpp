@@ -36,6 +36,26 @@ std::uint32_t next_code_point(std::string_view utf8, std::size_t& at) noexcept {
   return point;
 }
 
+struct CodePoints {
+  std::uint32_t first, last;
+};
+
+// In ascending order.
+constexpr CodePoints kUnsafeToDisplay[] = {
+    {0x00, 0x1f},       {0x7f, 0x9f},        // C0, DEL and C1
+    {0xad, 0xad},       {0x34f, 0x34f},      // soft hyphen, combining grapheme joiner
+    {0x61c, 0x61c},                          // Arabic letter mark
+    {0x115f, 0x1160},   {0x17b4, 0x17b5},    // fillers and inherent vowels, which show nothing
+    {0x180b, 0x180f},                        // Mongolian selectors and separator
+    {0x200b, 0x200f},   {0x2028, 0x202e},    // zero width, marks; separators, embeddings and overrides
+    {0x2060, 0x206f},                        // word joiner, invisible operators, isolates
+    {0x3164, 0x3164},                        // Hangul filler
+    {0xfe00, 0xfe0e},   {0xfeff, 0xfeff},    // selectors but the one of emoji, byte order mark
+    {0xffa0, 0xffa0},   {0xfff0, 0xfffb},    // half-width filler, interlinear annotation
+    {0x1bca0, 0x1bca3}, {0x1d173, 0x1d17a},  // shorthand and musical format controls
+    {0xe0000, 0xe0fff},                      // tags and further selectors
+};
+
 std::byte* put_unit(std::uint32_t unit, std::byte* out) noexcept {
   out[0] = static_cast<std::byte>(unit >> 8);
   out[1] = static_cast<std::byte>(unit);
@@ -82,6 +102,15 @@ TextCheck check_utf8(std::string_view text) noexcept {
     at += length;
   }
   return TextCheck::valid;
+}
+
+bool is_unsafe_to_display(std::string_view character) noexcept {
+  std::size_t at = 0;
+  const std::uint32_t point = character.empty() ? ' ' : next_code_point(character, at);
+  for (const CodePoints& range : kUnsafeToDisplay) {
+    if (point <= range.last) return point >= range.first;
+  }
+  return false;
 }
 
 std::size_t utf16_units(std::string_view utf8) noexcept {

@@ -16,6 +16,11 @@ enum class TextCheck { ascii, valid, invalid };
 /// The length in bytes of the UTF-8 character that begins at `text[at]`, or 0 when none does.
 [[nodiscard]] std::size_t utf8_character_length(std::string_view text, std::size_t at) noexcept;
 
+/// True for a character of valid UTF-8 that must not reach a terminal as it is, since it could end, redraw, reorder or
+/// hide a part of its line: C0 and C1 controls and DEL, line and paragraph separators, bidirectional controls,
+/// characters without width, and tags.
+[[nodiscard]] bool is_unsafe_to_display(std::string_view character) noexcept;
+
 /// How many UTF-16 code units a valid UTF-8 text takes.
 [[nodiscard]] std::size_t utf16_units(std::string_view utf8) noexcept;
 /// Writes a valid UTF-8 text as big-endian UTF-16 and returns the end of what it wrote: two bytes a unit.

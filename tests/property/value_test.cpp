@@ -91,6 +91,8 @@ TEST(Description, IsOneLineThatAReaderUnderstands) {
       {text("Gerät"), "Gerät"},
       {text("a\nb\r\t\x1b[2J\x7f"), "a\\nb\\r\\t\\x1b[2J\\x7f"},
       {text("\u0085\u2028"), "\\xc2\\x85\\xe2\\x80\\xa8"},
+      {text("\u202ea\u200b\ufeff\U000e0041\u00a0é😀"),
+       "\\xe2\\x80\\xaea\\xe2\\x80\\x8b\\xef\\xbb\\xbf\\xf3\\xa0\\x81\\x81\u00a0é😀"},
       {text(std::string_view("nul\0", 4)), "nul\\x00"},
       {text("100%s \"q\""), "100%s \"q\""},
       {PropertyValue::integer(-7), "-7"},

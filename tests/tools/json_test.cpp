@@ -12,6 +12,7 @@ namespace quorvel::tools {
 TEST(Json, PrintsWhatItReads) {
   const char* texts[] = {
       R"("text with \"quotes\", \u0000, \u001b and 日本語 😀")",
+      R"("\u007f\u009b2J\u2028\u202e\u200b\ufeff\udb40\udc41  ")",
       R"([true,0,-9223372036854775808,18446744073709551615,2.0,-0.0,1e+300,5e-324,0.1])",
       R"([{"$real":"inf"},{"$real":"-inf"},{"$real":"nan"},{"$real":"nan:fff8000000000001"}])",
       R"([{"$data":""},{"$data":"AA=="},{"$data":"AAE="},{"$data":"AAEC"}])",

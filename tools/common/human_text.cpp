@@ -53,6 +53,19 @@ void append_value(const PropertyValue& value, std::size_t depth, std::string& te
   }
 }
 
+// The text that `fill` puts into a sink; `size` is a guess at its length.
+template <typename Fill>
+std::string filled(std::size_t size, const Fill& fill) {
+  for (std::string text;; size *= 2) {
+    text.resize(size);
+    TextSink sink(text);
+    fill(sink);
+    if (sink.full()) continue;
+    text.resize(static_cast<std::size_t>(sink.position() - text.data()));
+    return text;
+  }
+}
+
 }  // namespace
 
 const Palette& palette() {
@@ -60,18 +73,13 @@ const Palette& palette() {
   return chosen;
 }
 
+std::string displayable(std::string_view text) {
+  return filled(text.size() * 4, [text](TextSink& sink) { sink.put_escaped(text); });
+}
+
 std::string one_line(const PropertyValue& value) {
   if (value.is_string() && value.text().empty()) return "\"\"";
-  std::string text(256, '\0');
-  for (;;) {
-    TextSink sink(text);
-    describe(value, sink);
-    if (!sink.full()) {
-      text.resize(static_cast<std::size_t>(sink.position() - text.data()));
-      return text;
-    }
-    text.resize(text.size() * 2);
-  }
+  return filled(256, [&value](TextSink& sink) { describe(value, sink); });
 }
 
 std::string human_text(const PropertyValue& value) {

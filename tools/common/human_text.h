@@ -16,6 +16,9 @@ struct Palette {
 /// The palette for standard output.
 [[nodiscard]] const Palette& palette();
 
+/// `text` on one line of a terminal, as the log would show it: what is unsafe to display is escaped.
+[[nodiscard]] std::string displayable(std::string_view text);
+
 /// A value that fits one line, described like in the log.
 [[nodiscard]] std::string one_line(const PropertyValue& value);
 

@@ -19,7 +19,8 @@
 
 namespace quorvel::tools {
 
-/// `value` as JSON text without a line end; over several lines when `indent` is not negative.
+/// `value` as JSON text without a line end; over several lines when `indent` is not negative. Characters that are
+/// unsafe to display are escaped.
 [[nodiscard]] std::string to_json(const PropertyValue& value, int indent);
 
 /// What a JSON text stands for, or why it stands for no value.

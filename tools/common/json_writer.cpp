@@ -8,6 +8,7 @@
 #include "date_text.h"
 #include "json.h"
 #include "json_forms.h"
+#include "property/unicode.h"
 
 namespace quorvel::tools {
 namespace {
@@ -72,14 +73,38 @@ json value_json(const PropertyValue& value) {
   return nullptr;
 }
 
+void append_code_unit(unsigned unit, std::string& text) {
+  char escape[8];
+  std::snprintf(escape, sizeof escape, "\\u%04x", unit & 0xffff);
+  text += escape;
+}
+
+// The JSON text, in which the serialiser has escaped C0 controls, with everything else that is unsafe to display
+// escaped as well. Such characters stand within strings only, but for the line ends between the elements.
+std::string displayable_json(const json& value, int indent) {
+  const std::string dumped = value.dump(indent, ' ', false, json::error_handler_t::replace);
+  std::string text;
+  text.reserve(dumped.size());
+  for (std::size_t at = 0; at < dumped.size();) {
+    const std::string_view character(dumped.data() + at, std::max<std::size_t>(utf8_character_length(dumped, at), 1));
+    at += character.size();
+    if (character == "\n" || !is_unsafe_to_display(character)) {
+      text += character;
+      continue;
+    }
+    std::byte units[4];
+    const std::byte* end = write_utf16(character, units);
+    for (const std::byte* unit = units; unit < end; unit += 2) {
+      append_code_unit(std::to_integer<unsigned>(unit[0]) << 8 | std::to_integer<unsigned>(unit[1]), text);
+    }
+  }
+  return text;
+}
+
 }  // namespace
 
-std::string to_json(const PropertyValue& value, int indent) {
-  return value_json(value).dump(indent, ' ', false, json::error_handler_t::replace);
-}
+std::string to_json(const PropertyValue& value, int indent) { return displayable_json(value_json(value), indent); }
 
-std::string json_string(std::string_view text) {
-  return json(text).dump(-1, ' ', false, json::error_handler_t::replace);
-}
+std::string json_string(std::string_view text) { return displayable_json(json(text), -1); }
 
 }  // namespace quorvel::tools

@@ -35,7 +35,7 @@ int print_no_value(const std::string& why, bool json) {
 }
 
 void note(const std::string& text) {
-  const std::string line = "quorvelctl: " + text + '\n';
+  const std::string line = "quorvelctl: " + displayable(text) + '\n';
   // A reader who cannot be told is not a reason to fail.
   [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, line.data(), line.size());
 }

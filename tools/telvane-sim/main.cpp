@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "common/failure.h"
+#include "common/human_text.h"
 #include "common/root_option.h"
 #include "platform/file_system.h"
 #include "platform/process.h"
@@ -92,7 +93,7 @@ int main(int count, char** words) {
   try {
     return quorvel::tools::run(count, words);
   } catch (const quorvel::tools::Failure& failure) {
-    std::fprintf(stderr, "telvane-sim: %s\n", failure.message.c_str());
+    std::fprintf(stderr, "telvane-sim: %s\n", quorvel::tools::displayable(failure.message).c_str());
     return failure.status;
   } catch (const std::bad_alloc&) {
     std::fputs("telvane-sim: memory does not suffice\n", stderr);
