@@ -1,5 +1,11 @@
 // What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
+#include <sys/socket.h>
+#include <sys/un.h>
+
+#include <cstddef>
+
 #include "linux/base/local_socket.h"
+#include "linux/process/service_manager.h"
 #include "platform/notification_center.h"
 #include "platform/process.h"
 #include "support/scratch_root.h"
@@ -62,6 +68,34 @@ TEST(ProcessStart, RefusesALockFileThatIsNone) {
   root.make_link("/decoy", "/run/quorvel/quorveld.lock");
   EXPECT_START(71, "^quorveld: cannot open the lock file [^\n]*\n$");
   EXPECT_FALSE(root.exists("/decoy"));
+}
+
+TEST(ProcessStart, RootLeavesNothingInAnothersPlace) {
+  if (::geteuid() != 0) GTEST_SKIP() << "needs to be root";
+  ScratchRoot root;
+  root.make_directory("/run/quorvel");
+  ASSERT_EQ(::chown(root.path("/run/quorvel").c_str(), 12345, 12345), 0);
+  EXPECT_START(77, "^quorveld: /run/quorvel belongs to user 12345: [^\n]*systemctl start quorveld\n$");
+  EXPECT_FALSE(root.exists("/run/quorvel/quorveld.lock"));
+}
+
+TEST(ProcessStart, TellsTheServiceManagerInOneLineWhatItDoes) {
+  sockaddr_un address = {AF_UNIX, {}};
+  const std::string name = "@quorvel-status-" + std::to_string(::getpid());
+  name.copy(address.sun_path, name.size());
+  address.sun_path[0] = '\0';
+  const Descriptor manager(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+  const auto length = static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + name.size());
+  ASSERT_EQ(::bind(manager.get(), reinterpret_cast<const sockaddr*>(&address), length), 0);
+  ::setenv("NOTIFY_SOCKET", name.c_str(), 1);
+  for (const auto& [text, told] : {std::pair<std::string, std::string>{"Listening", "STATUS=Listening"},
+                                   {"one\nREADY=1", "STATUS=one"},
+                                   {std::string(1000, 'x'), "STATUS=" + std::string(248, 'x')}}) {
+    platform::host::report_status(text);
+    char message[512];
+    const ssize_t size = ::recv(manager.get(), message, sizeof message, MSG_DONTWAIT);
+    EXPECT_EQ(std::string(message, static_cast<std::size_t>(std::max<ssize_t>(size, 0))), told);
+  }
 }
 
 TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {

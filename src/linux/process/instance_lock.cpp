@@ -2,6 +2,7 @@
 
 #include <sys/file.h>
 #include <sysexits.h>
+#include <unistd.h>
 
 #include <cerrno>
 
@@ -13,14 +14,26 @@ namespace quorvel::platform::host {
 
 namespace {
 
+constexpr char kServiceDirectory[] = "/run/quorvel";
 constexpr char kLockPath[] = "/run/quorvel/quorveld.lock";
 
 [[nodiscard]] bool make_service_directory() noexcept {
-  for (const char* path : {"/run", "/run/quorvel"}) {
+  for (const char* path : {"/run", kServiceDirectory}) {
     if (make_directory(path, 0755) == 0 || errno == EEXIST) continue;
     print_system_error("cannot make the directory %s", path);
     return false;
   }
+  return true;
+}
+
+// Files that root makes in another user's place keep that user's daemon from starting, and from logging.
+[[nodiscard]] bool would_lock_out_the_owner() noexcept {
+  struct stat directory;
+  if (::geteuid() != 0 || file_status(kServiceDirectory, &directory) != 0 || directory.st_uid == 0) return false;
+  print_error_line(
+      "%s belongs to user %u: run as that user, not as root; the installed service starts with: systemctl start "
+      "quorveld",
+      kServiceDirectory, static_cast<unsigned>(directory.st_uid));
   return true;
 }
 
@@ -37,6 +50,7 @@ constexpr char kLockPath[] = "/run/quorvel/quorveld.lock";
 
 int take_instance_lock() noexcept {
   if (!make_service_directory()) return EX_OSERR;
+  if (would_lock_out_the_owner()) return EX_NOPERM;
   Descriptor file = open_lock_file();
   if (!file) {
     print_system_error("cannot open the lock file %s", kLockPath);

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <charconv>
 #include <cstddef>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string_view>
@@ -78,6 +79,12 @@ constexpr int kMaximumPassedDescriptors = 1024;
   return sent >= 0;
 }
 
+void tell_manager(std::string_view message) noexcept {
+  const char* name = std::getenv("NOTIFY_SOCKET");
+  if (name == nullptr || name[0] == '\0') return;
+  if (!send_to_manager(name, message)) host::print_system_error("cannot tell the service manager at %s", name);
+}
+
 }  // namespace
 
 bool host::has_passed_socket() noexcept { return find_passed_socket() >= 0; }
@@ -91,10 +98,13 @@ Descriptor host::take_passed_socket() noexcept {
   return Descriptor(descriptor);
 }
 
-void report_ready() noexcept {
-  const char* name = std::getenv("NOTIFY_SOCKET");
-  if (name == nullptr || name[0] == '\0') return;
-  if (!send_to_manager(name, "READY=1")) host::print_system_error("cannot tell the service manager at %s", name);
+void host::report_status(std::string_view text) noexcept {
+  char message[256];
+  text = text.substr(0, text.find('\n'));
+  const int length = std::snprintf(message, sizeof message, "STATUS=%.*s", static_cast<int>(text.size()), text.data());
+  if (length > 0) tell_manager({message, std::min(static_cast<std::size_t>(length), sizeof message - 1)});
 }
+
+void report_ready() noexcept { tell_manager("READY=1"); }
 
 }  // namespace quorvel::platform

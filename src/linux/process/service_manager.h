@@ -1,5 +1,7 @@
-// The agreement with a service manager: sockets that it passes, and the message that the daemon serves.
+// The agreement with a service manager: sockets that it passes, and what it is told.
 #pragma once
+
+#include <string_view>
 
 #include "platform/descriptor.h"
 
@@ -10,5 +12,10 @@ namespace quorvel::platform::host {
 
 /// That socket, not blocking and closed on exec, or an empty descriptor. Main thread, once.
 [[nodiscard]] Descriptor take_passed_socket() noexcept;
+
+/// Tells the service manager, if there is one, in one line what the daemon does; it is shown to whoever asks for the
+/// service's status, until the next text replaces it. About 240 bytes are shown, a line break ends the text. Main
+/// thread.
+void report_status(std::string_view text) noexcept;
 
 }  // namespace quorvel::platform::host
