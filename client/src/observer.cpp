@@ -1,50 +1,38 @@
 #include "quorvel/observer.h"
 
-#include "channel.h"
-#include "property/binary/binary.h"
-#include "wire/service_path.h"
+#include "client/core/observation.h"
+#include "conversions.h"
 
 namespace quorvel::client {
-namespace {
-
-constexpr std::uint32_t kMaximumEvent = 16u << 20;
-
-Error protocol_error() {
-  return {ErrorCode::protocol_error, 0, "The notification center sent what an observer does not understand."};
-}
-
-}  // namespace
 
 class Observer::Connection {
  public:
-  explicit Connection(Descriptor descriptor) noexcept : channel_(std::move(descriptor)) {}
-
-  std::optional<Error> take_in(Deadline deadline) {
-    wire::Frame frame;
-    if (std::optional<Error> error = channel_.receive(frame, kMaximumEvent, deadline)) return error;
-    if (frame.head.kind != wire::FrameKind::ready) return protocol_error();
-    first_sequence_ = frame.head.serial;
+  std::optional<Error> open(const Options& options) {
+    Failure failure;
+    if (!observation_.open(target_of(options), failure)) return error_of(failure);
+    Notice notice;
+    if (std::optional<Error> error = wait_for(notice, kNever)) return error;
+    first_sequence_ = notice.sequence;
     return {};
   }
 
-  std::optional<Error> next(Event& event, Deadline deadline) {
-    wire::Frame frame;
-    if (std::optional<Error> error = channel_.receive(frame, kMaximumEvent, deadline)) return error;
-    const PropertyValue value = read_binary(frame.payload, Mutability::immutable);
-    event = Event{frame.head.serial, 0, std::string(frame.name), {}};
-    if (frame.head.kind == wire::FrameKind::notification) {
-      event.object = value;
-      return {};
+  std::optional<Error> wait_for(Notice& notice, Moment deadline) {
+    Failure failure;
+    for (;;) {
+      switch (observation_.step(notice, failure)) {
+        case Progress::done: return {};
+        case Progress::failed: return error_of(failure);
+        case Progress::waiting: break;
+      }
+      if (moment_now() >= deadline) return Error{ErrorCode::timed_out, 0, "No notification came in time."};
+      sleep_until_due(observation_.wait(), deadline);
     }
-    event.missed = value.to_uint64().value_or(0);
-    if (frame.head.kind == wire::FrameKind::missed && event.missed > 0) return {};
-    return protocol_error();
   }
 
   [[nodiscard]] std::uint64_t first_sequence() const noexcept { return first_sequence_; }
 
  private:
-  Channel channel_;
+  Observation observation_;
   std::uint64_t first_sequence_ = 0;
 };
 
@@ -55,12 +43,8 @@ Observer::~Observer() = default;
 
 std::optional<Error> Observer::connect() {
   connection_.reset();
-  const Deadline deadline = deadline_after(options_.timeout);
-  std::optional<Error> error;
-  Descriptor descriptor = connect_to_service(options_.root, std::string(wire::kNotificationSocket), deadline, error);
-  if (error) return error;
-  auto connection = std::make_unique<Connection>(std::move(descriptor));
-  error = connection->take_in(deadline);
+  auto connection = std::make_unique<Connection>();
+  std::optional<Error> error = connection->open(options_);
   if (!error) connection_ = std::move(connection);
   return error;
 }
@@ -69,8 +53,13 @@ std::uint64_t Observer::first_sequence() const noexcept { return connection_ ? c
 
 std::optional<Error> Observer::next(Event& event, std::chrono::milliseconds timeout) {
   if (!connection_) return Error{ErrorCode::disconnected, 0, "The observer is not connected."};
-  std::optional<Error> error = connection_->next(event, deadline_after(timeout));
-  if (error && error->code != ErrorCode::timed_out) connection_.reset();
+  Notice notice;
+  std::optional<Error> error = connection_->wait_for(notice, moment_after(timeout.count()));
+  if (!error) {
+    event = Event{notice.sequence, notice.missed, std::string(notice.name), std::move(notice.object)};
+  } else if (error->code != ErrorCode::timed_out) {
+    connection_.reset();
+  }
   return error;
 }
 
