@@ -1,42 +1,37 @@
-# bash completion for quorvelctl
+# bash completion for quorvelctl and telvane-sim: the program itself says what can stand next.
 
 _quorvelctl() {
-  local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local fields="sim-status iccid imsi firmware-version bootloader-version gid1 gid2 postponement"
-  local words=() word skip=0 i
-  for ((i = 1; i < COMP_CWORD; i++)); do
+  local program=${COMP_WORDS[0]} line current word i
+  program=${program/#\~\//$HOME/}
+  type -P -- "$program" >/dev/null || return
+  # bash parts words at "=", the program does not.
+  local -a words=()
+  for ((i = 1; i <= COMP_CWORD; i++)); do
     word=${COMP_WORDS[i]}
-    if ((skip)); then skip=0; continue; fi
-    case $word in
-      --root | --domain | --iccid | --imsi | --count) skip=1 ;;
-      -*) ;;
-      *) words+=("$word") ;;
-    esac
+    if ((${#words[@]})) && [[ $word == = || (${COMP_WORDS[i - 1]} == = && i -gt 1) ]]; then
+      words[-1]+=$word
+    else
+      words+=("$word")
+    fi
   done
-  case $previous in
-    --root) COMPREPLY=($(compgen -d -- "$current")); return ;;
-    --domain | --iccid | --imsi | --count) return ;;
-  esac
-  local choices=""
-  case "${words[*]}" in
-    "") choices="regulatory-images ark monitor preferences plist root log sim" ;;
-    ark) choices="list get" ;;
-    "ark list" | "ark get") [[ $current == -* ]] && choices="--domain" ;;
-    preferences) choices="list get set delete" ;;
-    "preferences "*) ((${#words[@]} == 2)) && choices="com.Orvane.quorveld" ;;
-    plist) choices="show write" ;;
-    "plist show" | "plist write") COMPREPLY=($(compgen -f -- "$current")); return ;;
-    root) choices="create" ;;
-    "root create") COMPREPLY=($(compgen -d -- "$current")); return ;;
-    log) [[ $current == -* ]] && choices="--follow" ;;
-    sim) choices="show set clear fail succeed notify insert eject" ;;
-    "sim set" | "sim clear") choices=$fields ;;
-    "sim fail" | "sim succeed") choices="${fields#sim-status } connection" ;;
-    "sim notify") choices="sim-newly-inserted sim-status-changed phone-number-changed postponement-status-changed" ;;
-    "sim insert") choices="--iccid --imsi" ;;
-  esac
-  [[ $current == -* ]] && choices+=" --json --root --help"
-  COMPREPLY=($(compgen -W "$choices" -- "$current"))
+  current=${COMP_WORDS[COMP_CWORD]}
+  [[ $current == = ]] && current=
+  # What is typed without its quotes, as the program would get it.
+  for i in "${!words[@]}"; do
+    word=${words[i]//[\"\']/}
+    words[i]=${word//\\/}
+  done
+  COMPREPLY=()
+  while IFS= read -r line; do
+    case $line in
+      :directory) compopt -o dirnames; return ;;
+      :file) compopt -o default; return ;;
+    esac
+    word=${line%%$'\t'*}
+    # A quote that is open goes on to quote the rest; without one the word is quoted where it needs to be.
+    [[ $current == [\"\']* ]] || printf -v word %q "$word"
+    COMPREPLY+=("$word")
+  done < <("$program" __complete "${words[@]}" 2>/dev/null)
 }
 
-complete -F _quorvelctl quorvelctl
+complete -F _quorvelctl quorvelctl telvane-sim

@@ -2,7 +2,10 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <utility>
+
+#include "property/value.h"
 
 namespace quorvel::tools {
 
@@ -18,5 +21,12 @@ struct Failure {
   int status;
   std::string message;
 };
+
+[[noreturn]] inline void fail_for_memory() { throw Failure{kUnreachable, "memory does not suffice"}; }
+
+/// Sets an entry of a dictionary; throws Failure when memory runs out.
+inline void put(PropertyValue& dictionary, std::string_view key, const PropertyValue& value) {
+  if (!dictionary.set(key, value)) fail_for_memory();
+}
 
 }  // namespace quorvel::tools

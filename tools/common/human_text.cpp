@@ -77,6 +77,14 @@ std::string displayable(std::string_view text) {
   return filled(text.size() * 4, [text](TextSink& sink) { sink.put_escaped(text); });
 }
 
+std::string shell_word(std::string_view word) {
+  constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_-./:,+@%";
+  if (!word.empty() && word.find_first_not_of(kPlain) == std::string_view::npos) return std::string(word);
+  std::string quoted = "'";
+  for (const char byte : word) quoted.append(byte == '\'' ? "'\\''" : std::string(1, byte));
+  return quoted + '\'';
+}
+
 std::string one_line(const PropertyValue& value) {
   if (value.is_string() && value.text().empty()) return "\"\"";
   return filled(256, [&value](TextSink& sink) { describe(value, sink); });

@@ -19,6 +19,9 @@ struct Palette {
 /// `text` on one line of a terminal, as the log would show it: what is unsafe to display is escaped.
 [[nodiscard]] std::string displayable(std::string_view text);
 
+/// `word` as a shell takes it for one word, quoted where needed.
+[[nodiscard]] std::string shell_word(std::string_view word);
+
 /// A value that fits one line, described like in the log.
 [[nodiscard]] std::string one_line(const PropertyValue& value);
 

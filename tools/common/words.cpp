@@ -3,8 +3,6 @@
 namespace quorvel::tools {
 namespace {
 
-constexpr char kMark = '\x01';
-
 bool needs_mark(const std::string& word) {
   if (word.empty()) return false;
   if (word[0] == '-') return word.size() > 1 && word[1] >= '0' && word[1] <= '9';

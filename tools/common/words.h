@@ -10,6 +10,9 @@
 
 namespace quorvel::tools {
 
+/// Stands in front of a marked word.
+inline constexpr char kMark = '\x01';
+
 /// The words of the call, in the parser's order (the last one first), marked where needed.
 [[nodiscard]] std::vector<std::string> marked_words(int count, char** words);
 

@@ -3,67 +3,116 @@
 #include <cerrno>
 
 #include "commands.h"
+#include "common/human_text.h"
 #include "common/words.h"
 #include "files.h"
 #include "live_answer.h"
 #include "output.h"
 #include "platform/file_system.h"
+#include "saved_ark.h"
 
 namespace quorvel::tools {
 namespace {
 
-constexpr const char* kStateDirectory = "/private/var/mobile/Library/qvd";
-constexpr const char* kArkFile = "/private/var/mobile/Library/qvd/data_ark.plist";
+constexpr const char* kSavesOnce = "The daemon saves once, at its start: what it holds now may differ";
 
 struct ArkWords {
   std::string domain;
   bool has_domain = false;
+  bool all = false;
+  bool domains = false;
+  bool raw = false;
   std::string key;
 };
 
-// The saved data ark; the daemon removes the file when it has nothing to save.
 PropertyValue read_ark() {
-  std::optional<PropertyValue> ark = read_device_plist(kArkFile);
-  if (!ark) {
-    struct stat status {};
-    if (platform::file_status(kStateDirectory, &status) != 0) fail_on("look into", kStateDirectory);
-    note(std::string("nothing is saved in ") + kArkFile);
-    return PropertyValue::dictionary();
-  }
-  if (ark->is_dictionary()) return *ark;
-  throw Failure{kUnreachable, std::string(kArkFile) + " is not a dictionary, so the daemon will set it aside"};
+  if (std::optional<PropertyValue> ark = read_saved_ark()) return *ark;
+  struct stat status {};
+  if (platform::file_status(kStateDirectory, &status) != 0) fail_on("look into", kStateDirectory);
+  note(std::string("nothing is saved in ") + kArkFile + ". " + kSavesOnce);
+  return PropertyValue::dictionary();
 }
 
 std::string in_domain(const ArkWords& words) {
   return words.has_domain ? " in the domain \"" + words.domain + '"' : " without a domain";
 }
 
-int list_domain(const ArkWords& words, bool json) {
-  const std::string prefix = words.domain + '-';
-  PropertyValue view = PropertyValue::dictionary();
-  const PropertyValue ark = read_ark();
-  for (const auto [key, value] : ark.entries()) {
-    if (!key.text().starts_with(prefix)) continue;
-    if (!view.set(key.text().substr(prefix.size()), value)) throw Failure{kUnreachable, "memory does not suffice"};
-  }
-  if (view.size() == 0) note("there are no saved entries" + in_domain(words));
-  return print_value(view, json);
+std::string list_command(const ArkWords& words) {
+  return std::string("quorvelctl ark list") + (words.has_domain ? " --domain " + shell_word(words.domain) : "");
 }
 
-int get_key(const ArkWords& words, bool json) {
-  const LiveAnswer live = live_answer(words.domain, words.has_domain, words.key);
-  if (live.is_live) {
-    if (live.value) return print_value(live.value, json);
-    return print_no_value("\"" + words.key +
-                              "\" is answered live, and the device-information service has no answer. "
-                              "Give it one in /etc/quorvel/device_information.plist",
-                          json);
+int list_domain(const ArkWords& words, const PropertyValue& ark, bool json) {
+  const std::string prefix = words.domain + '-';
+  PropertyValue view = PropertyValue::dictionary();
+  for (const auto [key, value] : ark.entries()) {
+    if (key.text().starts_with(prefix)) put(view, key.text().substr(prefix.size()), value);
+  }
+  if (view.size() > 0) return print_value(view, json);
+  if (ark.size() > 0)
+    note("there are no saved entries" + in_domain(words) + ". See all with: quorvelctl ark list --all");
+  if (json) write_output("{}\n");
+  return kDone;
+}
+
+// A dictionary of the domains, each a dictionary of its entries.
+PropertyValue by_domain(const PropertyValue& ark) {
+  PropertyValue view = PropertyValue::dictionary();
+  PropertyValue domain;
+  std::string name;
+  const std::vector<SavedEntry> entries = saved_entries(ark);
+  for (std::size_t i = 0; i < entries.size(); ++i) {
+    if (!domain) domain = PropertyValue::dictionary();
+    put(domain, entries[i].key, entries[i].value);
+    if (i + 1 < entries.size() && entries[i + 1].domain == entries[i].domain) continue;
+    put(view, entries[i].domain, std::exchange(domain, {}));
+  }
+  return view;
+}
+
+int list_all(const PropertyValue& ark, bool json) {
+  const PropertyValue view = by_domain(ark);
+  if (json || view.size() > 0) return print_value(view, json);
+  return kDone;
+}
+
+int list_domains(const PropertyValue& ark, bool json) {
+  PropertyValue names = PropertyValue::array();
+  std::string lines;
+  for (const SavedEntry& entry : saved_entries(ark)) {
+    const PropertyValue name = PropertyValue::string(entry.domain);
+    if (names.size() > 0 && names.at(names.size() - 1) == name) continue;
+    if (!names.append(name)) fail_for_memory();
+    lines += one_line(name) + '\n';
+  }
+  if (json) return print_value(names, true);
+  write_output(lines);
+  return kDone;
+}
+
+int list_entries(const ArkWords& words, bool json) {
+  if (words.all + words.domains + words.has_domain > 1) {
+    throw Failure{kWrongWords, "--all, --domains and --domain do not go together; use one of them"};
   }
   const PropertyValue ark = read_ark();
-  const PropertyValue& value = ark.get(words.domain + '-' + words.key);
-  if (value) return print_value(value, json);
-  return print_no_value(
-      "\"" + words.key + "\" is not saved" + in_domain(words) + ". See what is with: quorvelctl ark list", json);
+  if (words.all) return list_all(ark, json);
+  return words.domains ? list_domains(ark, json) : list_domain(words, ark, json);
+}
+
+int get_key(const ArkWords& words, const Form& form) {
+  const LiveAnswer live = live_answer(words.domain, words.has_domain, words.key);
+  if (live.is_live) {
+    if (live.value) return print_value(live.value, form);
+    return print_no_value("\"" + words.key +
+                              "\" is answered live, and this device does not know it. An administrator can give it in "
+                              "/etc/quorvel/device_information.plist",
+                          form.json);
+  }
+  const std::optional<PropertyValue> ark = read_saved_ark();
+  const PropertyValue value = ark ? ark->get(words.domain + '-' + words.key) : PropertyValue();
+  if (value) return print_value(value, form);
+  return print_no_value("\"" + words.key + "\" is not saved" + in_domain(words) +
+                            ". See what is with: " + list_command(words) + ". " + kSavesOnce,
+                        form.json);
 }
 
 void add_domain(CLI::App& command, ArkWords& words) {
@@ -73,28 +122,38 @@ void add_domain(CLI::App& command, ArkWords& words) {
 }  // namespace
 
 void add_ark(CLI::App& app, CommandLine& line) {
-  CLI::App* ark = add_command(app, "ark", "Read the saved data ark, without the daemon",
-                              "  quorvelctl ark list\n"
-                              "  quorvelctl ark get ProductVersion\n"
-                              "  quorvelctl ark get --domain com.Orvane.mobile.battery BatteryIsCharging");
+  CLI::App* ark = add_command(app, {"ark", "Read the saved data ark, without the daemon",
+                                    "  quorvelctl ark list --all\n"
+                                    "  quorvelctl ark get ProductVersion\n"
+                                    "  quorvelctl ark get --domain com.Orvane.mobile.battery \\\n"
+                                    "    BatteryIsCharging"});
   ark->require_subcommand(1);
   auto words = std::make_shared<ArkWords>();
 
-  CLI::App* list = add_command(*ark, "list", "Print a domain's saved entries",
-                               "  quorvelctl ark list --domain com.example.settings --json");
+  CLI::App* list =
+      add_command(*ark, {"list", "Print a domain's saved entries",
+                         "  quorvelctl ark list --domain com.example.settings --json\n"
+                         "  quorvelctl ark list --domains",
+                         "The daemon saves its entries once, at its start, and removes the file when there "
+                         "is nothing to save: what a running daemon holds may differ. Keys that are "
+                         "answered live are never saved; see quorvelctl facts."});
   add_domain(*list, *words);
+  list->add_flag("--all", words->all, "Every entry, by domain");
+  list->add_flag("--domains", words->domains, "The names of the domains that have entries");
   list->callback([&line, words, list] {
     words->has_domain = list->count("--domain") > 0;
-    line.run = [&line, words] { return list_domain(*words, line.json); };
+    line.run = [&line, words] { return list_entries(*words, line.json); };
   });
 
-  CLI::App* get = add_command(*ark, "get", "Print one key, live from the device where the daemon would ask it too",
-                              "  quorvelctl ark get PreviousSIMStatus");
+  CLI::App* get = add_command(*ark, {"get", "Print one key, live from the device where the daemon would ask it",
+                                     "  quorvelctl ark get PreviousSIMStatus\n"
+                                     "  quorvelctl ark get --raw SerialNumber"});
   add_domain(*get, *words);
+  add_raw(*get, words->raw);
   add_word(*get, "KEY", words->key, "The key")->required();
   get->callback([&line, words, get] {
     words->has_domain = get->count("--domain") > 0;
-    line.run = [&line, words] { return get_key(*words, line.json); };
+    line.run = [&line, words] { return get_key(*words, {line.json, words->raw}); };
   });
 }
 

@@ -6,6 +6,8 @@
 #include <functional>
 #include <string>
 
+#include "common/command_words.h"
+#include "common/completion.h"
 #include "common/failure.h"
 
 namespace quorvel::tools {
@@ -28,8 +30,7 @@ void add_root(CLI::App& app, CommandLine& line);
 void add_log(CLI::App& app, CommandLine& line);
 void add_sim(CLI::App& app, CommandLine& line);
 
-/// A command with its one-line summary and the examples that its help ends with.
-CLI::App* add_command(CLI::App& parent, const std::string& name, const std::string& summary,
-                      const std::string& examples);
+/// Known domains, keys, fields and names for an unfinished call.
+[[nodiscard]] std::vector<Candidate> candidates(const UnfinishedCall& call);
 
 }  // namespace quorvel::tools

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 
 #include "common/failure.h"
@@ -19,15 +20,15 @@ constexpr std::size_t kReadSize = 64u << 10;
 
 }  // namespace
 
-void fail_on(const std::string& verb, const std::string& path) {
+void fail_on(const std::string& verb, const std::string& path, Place place) {
   const int error = errno;
   std::string message = "cannot " + verb + ' ' + path + ": " + std::strerror(error);
-  if (error == EACCES || error == EPERM) message += ". Run as the device's user or with sudo";
-  if (error == ENOENT) message += ". Check the path and the device root (--root, QUORVEL_ROOT)";
+  if (error == EACCES || error == EPERM) message += ". Try again as its owner or with sudo";
+  if (error == ENOENT && place == Place::device) message += ". Check the device root (--root, QUORVEL_ROOT)";
   throw Failure{kUnreachable, std::move(message)};
 }
 
-std::string read_all(int descriptor, const std::string& path) {
+std::string read_all(int descriptor, const std::string& path, Place place) {
   std::string bytes;
   for (;;) {
     const std::size_t before = bytes.size();
@@ -35,14 +36,16 @@ std::string read_all(int descriptor, const std::string& path) {
     const ssize_t count = ::read(descriptor, bytes.data() + before, kReadSize);
     bytes.resize(before + (count > 0 ? static_cast<std::size_t>(count) : 0));
     if (count == 0) return bytes;
-    if (count < 0 && errno != EINTR) fail_on("read", path);
+    if (count < 0 && errno != EINTR) fail_on("read", path, place);
   }
 }
 
-std::optional<PropertyValue> read_device_plist(const std::string& path) {
+std::optional<PropertyValue> read_device_plist(const std::string& path, Links links) {
   // Without blocking, in case somebody put a pipe there.
-  const Descriptor file(platform::open_file(path.c_str(), O_RDONLY | O_NONBLOCK, 0));
+  const int flags = O_RDONLY | O_NONBLOCK | (links == Links::refused ? O_NOFOLLOW : 0);
+  const Descriptor file(platform::open_file(path.c_str(), flags, 0));
   if (!file && errno == ENOENT) return std::nullopt;
+  if (!file && errno == ELOOP) throw Failure{kUnreachable, path + " is a link, which the daemon does not follow"};
   if (!file) fail_on("open", path);
   struct stat status {};
   if (::fstat(file.get(), &status) != 0) fail_on("read", path);
@@ -53,7 +56,17 @@ std::optional<PropertyValue> read_device_plist(const std::string& path) {
 PropertyValue parse_plist(const std::string& bytes, const std::string& path) {
   PropertyValue value = read_binary(std::as_bytes(std::span(bytes)), Mutability::mutable_containers);
   if (value) return value;
-  throw Failure{kUnreachable, path + " does not hold a binary property list. Make one with: quorvelctl plist write"};
+  throw Failure{kUnreachable, path + " does not hold a binary property list"};
+}
+
+bool is_installed_system() {
+  const char* root = std::getenv("QUORVEL_ROOT");
+  return root == nullptr || std::string_view(root) == "/";
+}
+
+std::string how_to_start(const std::string& program) {
+  if (is_installed_system()) return "Start it with: sudo systemctl start " + program;
+  return "Start " + program + " with the same device root (--root, QUORVEL_ROOT)";
 }
 
 std::string plist_bytes(const PropertyValue& value) {
@@ -63,11 +76,11 @@ std::string plist_bytes(const PropertyValue& value) {
   return {reinterpret_cast<const char*>(bytes.data()), bytes.size()};
 }
 
-void write_all(int descriptor, const std::string& bytes, const std::string& path) {
+void write_all(int descriptor, const std::string& bytes, const std::string& path, Place place) {
   std::size_t done = 0;
   while (done < bytes.size()) {
     const ssize_t count = ::write(descriptor, bytes.data() + done, bytes.size() - done);
-    if (count < 0 && errno != EINTR) fail_on("write", path);
+    if (count < 0 && errno != EINTR) fail_on("write", path, place);
     if (count > 0) done += static_cast<std::size_t>(count);
   }
 }

@@ -83,9 +83,9 @@ int print_log(bool json, bool follow) {
 }  // namespace
 
 void add_log(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, "log", "Print the daemon's log, the previous generation first",
-                                  "  quorvelctl log | tail -n 20\n"
-                                  "  quorvelctl log --follow");
+  CLI::App* command = add_command(app, {"log", "Print the daemon's log, the previous generation first",
+                                        "  quorvelctl log | tail -n 20\n"
+                                        "  quorvelctl log --follow"});
   auto follow = std::make_shared<bool>(false);
   command->add_flag("--follow,-f", *follow, "Go on printing what is logged, until interrupted");
   command->callback([&line, follow] { line.run = [&line, follow] { return print_log(line.json, *follow); }; });

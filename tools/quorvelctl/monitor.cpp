@@ -63,9 +63,9 @@ int run_monitor(bool json) {
 }  // namespace
 
 void add_monitor(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, "monitor", "Print each posted notification as it arrives, until interrupted",
-                                  "  quorvelctl monitor\n"
-                                  "  quorvelctl monitor --json | jq -r .name");
+  CLI::App* command = add_command(app, {"monitor", "Print each posted notification as it arrives, until interrupted",
+                                        "  quorvelctl monitor\n"
+                                        "  quorvelctl monitor --json | jq -r .name"});
   command->callback([&line] { line.run = [&line] { return run_monitor(line.json); }; });
 }
 

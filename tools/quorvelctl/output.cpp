@@ -28,6 +28,25 @@ int print_value(const PropertyValue& value, bool json) {
   return kDone;
 }
 
+void add_raw(CLI::App& command, bool& raw) {
+  command.add_flag("--raw", raw, "Print a text without escapes and data as its bytes, for a file or a pipe");
+}
+
+int print_value(const PropertyValue& value, const Form& form) {
+  if (form.json && form.raw) throw Failure{kWrongWords, "--json and --raw do not go together; use one of them"};
+  const bool terminal = ::isatty(STDOUT_FILENO) == 1;
+  if (form.raw && value.kind() == PropertyKind::data) {
+    if (terminal) throw Failure{kWrongWords, "the value is data, which a terminal cannot show; redirect it to a file"};
+    write_output({reinterpret_cast<const char*>(value.bytes().data()), value.bytes().size()});
+    return kDone;
+  }
+  if (form.raw && value.is_string() && !terminal) {
+    write_output(std::string(value.text()) + '\n');
+    return kDone;
+  }
+  return print_value(value, form.json);
+}
+
 int print_no_value(const std::string& why, bool json) {
   if (json) write_output("null\n");
   note(why);

@@ -1,6 +1,7 @@
 // What goes to standard output: the value asked for and nothing else. Everything else goes to standard error.
 #pragma once
 
+#include <CLI/CLI.hpp>
 #include <string>
 #include <string_view>
 
@@ -13,6 +14,19 @@ void write_output(std::string_view text);
 
 /// Prints a value for a reader or as JSON. Returns kDone.
 int print_value(const PropertyValue& value, bool json);
+
+/// How a single value is printed.
+struct Form {
+  bool json = false;
+  bool raw = false;
+};
+
+/// The switch --raw of a command that prints a single value.
+void add_raw(CLI::App& command, bool& raw);
+
+/// Prints a single value. With `raw`, data is its bytes and nothing else, and a text its own line; a terminal gets
+/// neither bytes nor characters that are unsafe to display. Returns kDone.
+int print_value(const PropertyValue& value, const Form& form);
 
 /// For a value that is not there: `null` with `json`, and `why` on standard error. Returns kNoValue.
 int print_no_value(const std::string& why, bool json);

@@ -18,10 +18,11 @@ namespace {
 constexpr const char* kStandardStream = "-";
 
 int show_file(const std::string& path, bool json) {
-  if (path == kStandardStream) return print_value(parse_plist(read_all(STDIN_FILENO, "standard input"), path), json);
+  if (path == kStandardStream)
+    return print_value(parse_plist(read_all(STDIN_FILENO, "standard input", Place::anywhere), path), json);
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY));
-  if (!file) fail_on("open", path);
-  return print_value(parse_plist(read_all(file.get(), path), path), json);
+  if (!file) fail_on("open", path, Place::anywhere);
+  return print_value(parse_plist(read_all(file.get(), path, Place::anywhere), path), json);
 }
 
 // A file that is there or is to be made is replaced as a whole; anything else, such as a pipe, is written into.
@@ -33,20 +34,20 @@ void write_file(const std::string& given, const std::string& bytes) {
   const bool exists = ::stat(path.c_str(), &status) == 0;
   if (exists && !S_ISREG(status.st_mode)) {
     const Descriptor file(::open(path.c_str(), O_WRONLY | O_CLOEXEC | O_NOCTTY));
-    if (!file) fail_on("open", path);
-    return write_all(file.get(), bytes, path);
+    if (!file) fail_on("open", path, Place::anywhere);
+    return write_all(file.get(), bytes, path, Place::anywhere);
   }
   std::string temporary = path + ".XXXXXX";
   const Descriptor file(::mkostemp(temporary.data(), O_CLOEXEC));
-  if (!file) fail_on("create", path);
+  if (!file) fail_on("create", path, Place::anywhere);
   try {
     const mode_t mask = ::umask(0);
     ::umask(mask);
     const mode_t mode = exists ? status.st_mode & 07777 : 0666 & ~mask;
-    write_all(file.get(), bytes, path);
+    write_all(file.get(), bytes, path, Place::anywhere);
     if (exists && ::fchown(file.get(), status.st_uid, status.st_gid) != 0) note("the owner of " + path + " changes");
-    if (::fchmod(file.get(), mode) != 0 || ::fsync(file.get()) != 0) fail_on("write", path);
-    if (::rename(temporary.c_str(), path.c_str()) != 0) fail_on("replace", path);
+    if (::fchmod(file.get(), mode) != 0 || ::fsync(file.get()) != 0) fail_on("write", path, Place::anywhere);
+    if (::rename(temporary.c_str(), path.c_str()) != 0) fail_on("replace", path, Place::anywhere);
   } catch (const Failure&) {
     ::unlink(temporary.c_str());
     throw;
@@ -54,7 +55,8 @@ void write_file(const std::string& given, const std::string& bytes) {
 }
 
 int write_plist(const std::string& path) {
-  const PropertyValue value = value_of_word(read_all(STDIN_FILENO, "standard input"), "standard input");
+  const PropertyValue value =
+      value_of_word(read_all(STDIN_FILENO, "standard input", Place::anywhere), "standard input");
   if (!value) throw Failure{kWrongWords, "standard input: null is no value that a property list can hold"};
   const std::string bytes = plist_bytes(value);
   if (path == kStandardStream) {
@@ -68,15 +70,16 @@ int write_plist(const std::string& path) {
 }  // namespace
 
 void add_plist(CLI::App& app, CommandLine& line) {
-  CLI::App* plist = add_command(app, "plist", "Show and write property-list files",
-                                "  quorvelctl plist show images.plist\n"
-                                "  echo '{\"Label\": {\"$data\": \"AAEC\"}}' | quorvelctl plist write images.plist\n"
-                                "  quorvelctl plist show a.plist --json | quorvelctl plist write b.plist\n\n"
-                                "FILE is an ordinary path; the device root does not count here.");
+  CLI::App* plist =
+      add_command(app, {"plist", "Show and write property-list files",
+                        "  quorvelctl plist show images.plist\n"
+                        "  echo '{\"Label\": {\"$data\": \"AAEC\"}}' | quorvelctl plist write images.plist\n"
+                        "  quorvelctl plist show a.plist --json | quorvelctl plist write b.plist\n\n"
+                        "FILE is an ordinary path; the device root does not count here."});
   plist->require_subcommand(1);
   auto file = std::make_shared<std::string>();
   CLI::App* show =
-      add_command(*plist, "show", "Print a property-list file", "  quorvelctl plist show --json images.plist");
+      add_command(*plist, {"show", "Print a property-list file", "  quorvelctl plist show --json images.plist"});
   add_word(*show, "FILE", *file, "The file; - is standard input")->required();
   show->callback([&line, file] {
     line.uses_root = false;
@@ -84,8 +87,8 @@ void add_plist(CLI::App& app, CommandLine& line) {
   });
 
   CLI::App* write =
-      add_command(*plist, "write", "Write a property-list file from the JSON on standard input",
-                  "  echo '[1, 2.5, true, {\"$date\": \"2026-01-31T12:00:00Z\"}]' | quorvelctl plist write -");
+      add_command(*plist, {"write", "Write a property-list file from the JSON on standard input",
+                           "  echo '[1, true, {\"$date\": \"2026-01-31T12:00:00Z\"}]' | quorvelctl plist write -"});
   add_word(*write, "FILE", *file, "The file, replaced as a whole; - is standard output")->required();
   write->callback([&line, file] {
     line.uses_root = false;

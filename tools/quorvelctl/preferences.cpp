@@ -142,15 +142,15 @@ int delete_preference(const PreferenceWords& words, bool json) {
 
 void add_preferences(CLI::App& app, CommandLine& line) {
   CLI::App* preferences =
-      add_command(app, "preferences", "Show and change the preferences store",
-                  "  quorvelctl preferences list com.Orvane.quorveld\n"
-                  "  quorvelctl preferences set com.Orvane.quorveld ExtLogging 1\n"
-                  "  quorvelctl preferences delete com.Orvane.quorveld ExtLogging\n\n"
-                  "The daemon reads its own preferences when it starts: restart it after a change.");
+      add_command(app, {"preferences", "Show and change the preferences store",
+                        "  quorvelctl preferences list com.Orvane.quorveld\n"
+                        "  quorvelctl preferences set com.Orvane.quorveld ExtLogging 1\n"
+                        "  quorvelctl preferences delete com.Orvane.quorveld ExtLogging\n\n"
+                        "The daemon reads its own preferences when it starts: restart it after a change."});
   preferences->require_subcommand(1);
   auto words = std::make_shared<PreferenceWords>();
   const auto add = [&](const char* name, const char* summary, const char* example, bool key, auto run) {
-    CLI::App* command = add_command(*preferences, name, summary, example);
+    CLI::App* command = add_command(*preferences, {name, summary, example});
     add_word(*command, "DOMAIN", words->domain, "Reverse-DNS name, such as com.Orvane.quorveld")->required();
     if (key) add_word(*command, "KEY", words->key, "The key")->required();
     command->callback([&line, words, run] { line.run = [&line, words, run] { return run(*words, line.json); }; });

@@ -5,9 +5,9 @@
 namespace quorvel::tools {
 
 void add_regulatory_images(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, "regulatory-images", "Ask the daemon for the regulatory images and print them",
-                                  "  quorvelctl regulatory-images\n"
-                                  "  quorvelctl --root /tmp/device regulatory-images --json");
+  CLI::App* command = add_command(app, {"regulatory-images", "Ask the daemon for the regulatory images and print them",
+                                        "  quorvelctl regulatory-images\n"
+                                        "  quorvelctl --root /tmp/device regulatory-images --json"});
   command->callback([&line] {
     line.run = [&line] {
       const client::Reply reply = client::Client().copy_regulatory_images();

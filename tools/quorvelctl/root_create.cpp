@@ -85,13 +85,13 @@ int create_root(const std::string& path) {
 }  // namespace
 
 void add_root(CLI::App& app, CommandLine& line) {
-  CLI::App* root = add_command(app, "root", "Make a device root, a directory that stands for the device's /",
-                               "  quorvelctl root create /tmp/device");
+  CLI::App* root = add_command(app, {"root", "Make a device root, a directory that stands for the device's /",
+                                     "  quorvelctl root create /tmp/device"});
   root->require_subcommand(1);
-  CLI::App* create = add_command(*root, "create", "Make a device root; what is there already stays as it is",
-                                 "  quorvelctl root create /tmp/device\n"
-                                 "  export QUORVEL_ROOT=/tmp/device\n"
-                                 "  telvane-sim & quorveld & quorvelctl regulatory-images");
+  CLI::App* create = add_command(*root, {"create", "Make a device root; what is there already stays as it is",
+                                         "  quorvelctl root create /tmp/device\n"
+                                         "  export QUORVEL_ROOT=/tmp/device\n"
+                                         "  telvane-sim & quorveld & quorvelctl regulatory-images"});
   auto directory = std::make_shared<std::string>();
   add_word(*create, "DIR", *directory, "The directory, made when it is missing")->required();
   create->callback([&line, directory] {

@@ -130,7 +130,7 @@ using Words = std::shared_ptr<SimWords>;
 
 CLI::App* add(CLI::App& sim, CommandLine& line, const Words& words, const char* name, const char* summary,
               const std::string& example, int (*run)(const SimWords&, bool json)) {
-  CLI::App* command = add_command(sim, name, summary, example);
+  CLI::App* command = add_command(sim, {name, summary, example});
   command->callback([&line, words, run] { line.run = [&line, words, run] { return run(*words, line.json); }; });
   return command;
 }
@@ -206,10 +206,10 @@ void add_event_commands(CLI::App& sim, CommandLine& line, const Words& words) {
 }  // namespace
 
 void add_sim(CLI::App& app, CommandLine& line) {
-  CLI::App* sim = add_command(app, "sim", "Show and change what telvane-sim, the simulated telephony service, answers",
-                              "  quorvelctl sim insert --iccid 8944501234567890123 --imsi 234150999999999\n"
-                              "  quorvelctl sim show\n"
-                              "  quorvelctl sim eject");
+  CLI::App* sim = add_command(app, {"sim", "Show and change what telvane-sim, the simulated telephony service, answers",
+                                    "  quorvelctl sim insert --iccid 8944501234567890123 --imsi 234150999999999\n"
+                                    "  quorvelctl sim show\n"
+                                    "  quorvelctl sim eject"});
   sim->require_subcommand(1);
   const auto words = std::make_shared<SimWords>();
   add_state_commands(*sim, line, words);

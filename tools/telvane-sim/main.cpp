@@ -6,9 +6,13 @@
 #include <cstdio>
 #include <cstring>
 
+#include "common/command_words.h"
+#include "common/completion.h"
 #include "common/failure.h"
+#include "common/help_text.h"
 #include "common/human_text.h"
 #include "common/root_option.h"
+#include "common/words.h"
 #include "platform/file_system.h"
 #include "platform/process.h"
 #include "server.h"
@@ -23,16 +27,18 @@ constexpr int kServiceUnavailable = 69;
 constexpr int kSystemError = 71;
 constexpr int kConfiguration = 78;
 
-constexpr const char* kFooter = R"(
-Serves /run/quorvel/telvane.sock in the device root, in the foreground, until
-SIGTERM or SIGINT. It starts without a SIM and with every query answering nothing.
+constexpr const char* kWords =
+    "Serve as the telephony service of a machine without a modem\n\n"
+    "Serves /run/quorvel/telvane.sock in the device root, in the foreground, until SIGTERM or SIGINT. It starts "
+    "without "
+    "a SIM and with every query answering nothing; quorvelctl sim changes that.\n\n"
+    "Exit status: 0 stopped by a signal; 64 the words of the call are off; 69 another one serves the socket; 71 the "
+    "socket cannot be had; 78 the device root names no directory.";
 
-Examples:
-  telvane-sim --root /tmp/device &
-  quorvelctl --root /tmp/device sim insert --iccid 8944501234567890123 --imsi 234150999999999
-
-Exit status: 0 stopped by a signal; 64 the words of the call are off; 69 another
-one serves the socket; 71 the socket cannot be had; 78 the device root is none.)";
+constexpr const char* kExamples =
+    "  telvane-sim --root /tmp/device &\n"
+    "  quorvelctl --root /tmp/device sim insert --iccid 8944501234567890123 \\\n"
+    "    --imsi 234150999999999";
 
 Descriptor open_signals() {
   std::signal(SIGPIPE, SIG_IGN);
@@ -68,18 +74,21 @@ void serve() {
 }
 
 int run(int count, char** words) {
-  CLI::App app("A telephony service for machines without a modem.", "telvane-sim");
+  CLI::App app(kWords, "telvane-sim");
+  app.formatter(std::make_shared<HelpFormatter>());
+  app.footer(kExamples);
   std::string root;
-  app.footer(kFooter);
-  app.set_version_flag("--version", QUORVEL_VERSION);
-  app.add_option("--root", root, "Device root: the directory that stands for the device's / (default: QUORVEL_ROOT)")
-      ->type_name("")
-      ->option_text("DIR");
+  add_word(app, "--root", root, kRootHelp)->option_text("DIR");
+  app.set_version_flag("--version", "telvane-sim " QUORVEL_VERSION, "Print the version and end");
+  if (const std::optional<std::string> answer = answer_for_tools(app, count, words, {})) {
+    std::fputs(answer->c_str(), stdout);
+    return 0;
+  }
   try {
-    app.parse(count, words);
+    app.parse(marked_words(count, words));
   } catch (const CLI::ParseError& error) {
     if (error.get_exit_code() == 0) return app.exit(error);
-    throw Failure{kUsage, std::string(error.what()) + ". See: telvane-sim --help"};
+    throw Failure{kUsage, complaint(app, error)};
   }
   use_device_root(app.count("--root") > 0 ? std::optional(root) : std::nullopt, kConfiguration);
   serve();

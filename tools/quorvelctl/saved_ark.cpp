@@ -1,0 +1,32 @@
+#include "saved_ark.h"
+
+#include <algorithm>
+#include <tuple>
+
+#include "common/failure.h"
+#include "files.h"
+
+namespace quorvel::tools {
+
+std::optional<PropertyValue> read_saved_ark() {
+  std::optional<PropertyValue> ark = read_device_plist(kArkFile, Links::refused);
+  if (!ark || ark->is_dictionary()) return ark;
+  throw Failure{kUnreachable, std::string(kArkFile) + " is not a dictionary, so the daemon does not load it"};
+}
+
+std::vector<SavedEntry> saved_entries(const PropertyValue& ark) {
+  std::vector<SavedEntry> entries;
+  entries.reserve(ark.size());
+  for (const auto [key, value] : ark.entries()) {
+    const std::string_view name = key.text();
+    const std::size_t hyphen = std::min(name.find('-'), name.size());
+    entries.push_back(
+        {std::string(name.substr(0, hyphen)), std::string(name.substr(std::min(hyphen + 1, name.size()))), value});
+  }
+  std::sort(entries.begin(), entries.end(), [](const SavedEntry& a, const SavedEntry& b) {
+    return std::tie(a.domain, a.key) < std::tie(b.domain, b.key);
+  });
+  return entries;
+}
+
+}  // namespace quorvel::tools
