@@ -1,17 +1,30 @@
-# Debian packages that the other scripts need. To be sourced.
+# shellcheck shell=bash
+# The Debian packages that the scripts need, each list once. To be sourced.
 
-# What it takes to configure and build everything, tests included.
-build_packages=(g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev)
+declare -A packages=(
+  # To configure and build everything, tests included.
+  [build]="g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev"
+  [clang]="clang"
+  [lint]="clang clang-format clang-tidy shellcheck"
+  [coverage]="clang llvm"
+  [mutants]="git python3"
+  [bench]="libbenchmark-dev pkg-config gnuplot-nox"
+  # The contenders of the benchmarks.
+  [contenders]="libmsgpack-cxx-dev libglib2.0-dev libabsl-dev libspdlog-dev libsystemd-dev dbus-daemon redis-server"
+)
 
-# ensure_packages PACKAGE...: installs those that are missing, through sudo when this is not root. Quick when none is.
+# ensure_packages LIST...: installs what is missing of these lists, through sudo when this is not root. Quick when nothing
+# is missing.
 ensure_packages() {
-  local missing=() package as_root=()
+  local missing=() list package as_root=()
   if ! command -v dpkg-query >/dev/null || ! command -v apt-get >/dev/null; then
-    echo "This is no Debian system: the equivalents of these packages must be there: $*" >&2
+    echo "This is no Debian system: the equivalents of the packages in scripts/packages.sh must be there." >&2
     return 0
   fi
-  for package; do
-    dpkg-query -W -f='${db:Status-Status}\n' "$package" 2>/dev/null | grep -qx installed || missing+=("$package")
+  for list; do
+    for package in ${packages[$list]:?no list of packages is called so}; do
+      dpkg-query -W -f='${db:Status-Status}\n' "$package" 2>/dev/null | grep -qx installed || missing+=("$package")
+    done
   done
   ((${#missing[@]})) || return 0
   if ((EUID != 0)); then

@@ -35,8 +35,6 @@ PropertyValue kept_entries() {
 
 }  // namespace
 
-bool is_long_run() { return std::getenv("QUORVEL_FAULTS_LONG") != nullptr; }
-
 DaemonUnderFaults::DaemonUnderFaults() : plan_path_((root.outside() / "plan").string()), plan_(map_plan(plan_path_)) {
   root.ignore_log();
   PropertyValue entries = kept_entries();

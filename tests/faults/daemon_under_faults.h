@@ -3,13 +3,11 @@
 
 #include "faults/shim/plan.h"
 #include "quorvel/client.h"
+#include "support/figures.h"
 #include "support/program.h"
 #include "support/scratch_root.h"
 
 namespace quorvel::test {
-
-/// True where every case is tried instead of a selection.
-[[nodiscard]] bool is_long_run();
 
 /// One device root for many daemons, one after the other. Its data ark holds an entry that no save keeps, so that the
 /// file before a start and the one after its save differ.

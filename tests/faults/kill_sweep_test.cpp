@@ -52,8 +52,10 @@ class KillSweep : public testing::Test {
   }
 
   void report(const char* name) const {
-    std::printf("figures: kill sweep, %s: kills=%d inside_the_save=%d torn_or_lost=%d\n", name, kills, inside_save,
-                failures);
+    tell_figure(std::string("killed at ") + name, "0 torn, 0 lost",
+                std::to_string(kills) + " kills, " + std::to_string(inside_save) + " in the save, " +
+                    std::to_string(failures) + " torn or lost",
+                failures == 0);
   }
 
   DaemonUnderFaults daemon;

@@ -5,6 +5,7 @@
 
 #include "hardening/allocations.h"
 #include "property/limits.h"
+#include "support/figures.h"
 #include "support/values.h"
 
 namespace quorvel::test {
@@ -175,9 +176,10 @@ TEST(MalformedFiles, HoldNoValueOrASoundOneAtABoundedCost) {
     }
   }
   for (const std::string& file : made_by_hand()) ASSERT_NO_FATAL_FAILURE(try_file(file, figures));
-  std::cout << figures.files << " files, " << figures.values << " with a value; the slowest took "
-            << figures.slowest * 100 << " % of the time allowed\n";
-  EXPECT_GE(figures.files, 5000u);
+  tell_figure("malformed files", "5,000 files",
+              std::to_string(figures.files) + " files, " + std::to_string(figures.values) + " with a value; slowest " +
+                  std::to_string(static_cast<int>(figures.slowest * 100)) + " % of the time allowed",
+              figures.files >= 5000);
   EXPECT_GE(figures.values, 500u);
   EXPECT_LE(figures.values, figures.files / 2);
 }

@@ -2,29 +2,12 @@
 #pragma once
 
 #include "quorvel/client.h"
+#include "support/figures.h"
 #include "support/program.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
 
 namespace quorvel::test {
-
-// What the stress tests measure, and how it is told: one line for each figure, which scripts/stress puts into a table.
-
-/// A sanitizer slows everything down and keeps memory that was freed: figures are told then, but not judged.
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-inline constexpr bool kInstrumented = true;
-#else
-inline constexpr bool kInstrumented = false;
-#endif
-
-/// The first for a run among the other tests (a tenth of it under a sanitizer), the second for scripts/stress.
-[[nodiscard]] long quick_or_long(long quick, long long_run);
-[[nodiscard]] bool is_long_run();
-
-/// Prints a figure beside its goal. One that is missed fails the test.
-void tell_figure(std::string_view what, std::string_view goal, const std::string& measured, bool met);
-/// The same where the machine decides as well as the program: a miss is told, and fails nothing.
-void tell_machine_figure(std::string_view what, std::string_view goal, const std::string& measured, bool met);
 
 /// Of process `pid`: memory now, and the most since the last `forget_peak`, in KiB; processor time used.
 [[nodiscard]] long resident_kib(pid_t pid);
