@@ -36,8 +36,8 @@ inline constexpr StaticText kStateCodeKey = "Code";
 inline constexpr StaticText kSimStatusReady = "Ready";
 inline constexpr StaticText kSimStatusNotInserted = "NotInserted";
 
-// Commands are calls on the service's socket, answered in turn: with the state (show), with no value (the others), or
-// with a failure. A connection that has made a call is sent replies only, no events.
+// Commands are calls on the service's socket, answered in turn: with the state (show), with the observers (notify),
+// with no value (the others), or with a failure. A connection that has made a call is sent replies only, no events.
 //
 //   command  argument, a dictionary                  effect
 //   show     none                                    the reply is the state
@@ -56,6 +56,10 @@ inline constexpr std::string_view kNotifyCommand = "notify";
 inline constexpr StaticText kCommandFieldKey = "Field";
 inline constexpr StaticText kCommandNameKey = "Name";
 inline constexpr StaticText kCommandCountKey = "Count";
+
+/// In the reply to notify: how many observers there are at its end, and how many were cut off meanwhile.
+inline constexpr StaticText kReplyObserversKey = "Observers";
+inline constexpr StaticText kReplyCutOffKey = "CutOff";
 
 /// The largest state that is taken from the service; the rest of a connection that sends more is not read.
 inline constexpr std::uint32_t kMaximumStateBody = 256u << 20;

@@ -1,4 +1,6 @@
 // quorvelctl as a person and a script use it: what it prints where, and how it ends.
+#include <fstream>
+
 #include "support/program.h"
 #include "support/scratch_root.h"
 
@@ -63,6 +65,10 @@ TEST_F(Quorvelctl, ReadsTheSavedArkAsTheDaemonWould) {
       {{"ark", "list", "--json"}, 0, "{\n  \"Key\": 5,\n  \"ProductVersion\": \"stored\"\n}\n"},
       {{"ark", "list", "--domain", "a", "--json"}, 0, "{\n  \"\": true,\n  \"b-c\": \"x\"\n}\n"},
       {{"ark", "list", "--domain", "none", "--json"}, 0, "{}\n"},
+      {{"ark", "list", "--domains"}, 0, "\"\"\na\n"},
+      {{"ark", "list", "--all"}, 0, "\"\":\n  Key: 5\n  ProductVersion: stored\na:\n  \"\": true\n  b-c: x\n"},
+      {{"ark", "list", "--all", "--domains"}, 2, ""},
+      {{"ark", "get", "--raw", "--domain", "a", "b-c"}, 0, "x\n"},
       {{"ark", "get", "Key"}, 0, "5\n"},
       {{"ark", "get", "--domain", "a-b", "c", "--json"}, 0, "\"x\"\n"},
       {{"ark", "get", "ProductVersion", "--json"}, 0, "\"2.5\"\n"},
@@ -116,7 +122,23 @@ TEST_F(Quorvelctl, WritesPropertyListsThatItShows) {
 
 TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   const std::string made = root.outside() / "made" / "device";
-  for (int i = 0; i < 2; ++i) EXPECT_EQ(run_to_end(control_program(), {"root", "create", made}).status, 0);
+  const std::string sample = made + "/etc/quorvel/device_information.plist";
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", made}).status, 0);
+  EXPECT_TRUE(std::filesystem::exists(made + "/etc/quorvel/telephony"));
+  EXPECT_EQ(std::filesystem::status(made + "/private/var/mobile/Library/qvd").permissions(),
+            std::filesystem::perms::owner_all);
+  std::ofstream(sample) << "the user's own";
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", made}).status, 0);
+  EXPECT_EQ(std::filesystem::file_size(sample), 14u);
+  // Everything is checked before anything is made.
+  const std::string foreign = root.outside() / "foreign";
+  std::filesystem::create_directories(foreign + "/var");
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", foreign}).status, 3);
+  std::filesystem::rename(foreign + "/var", foreign + "/run");
+  std::ofstream(foreign + "/etc") << "a file";
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", foreign}).status, 3);
+  EXPECT_FALSE(std::filesystem::exists(foreign + "/private"));
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", "//"}).status, 2);
   EXPECT_EQ(std::filesystem::read_symlink(made + "/var"), "private/var");
   Program simulator(simulator_program(), {.input = {}, .environment = {{"QUORVEL_ROOT", made}}});
   ASSERT_TRUE(simulator.wait_for_output("ready"));
@@ -131,6 +153,14 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   EXPECT_NE(call({"regulatory-images", "--json"}).out.find("\"Mark\": \"CE\""), std::string::npos);
   EXPECT_EQ(call({"sim", "insert", "--iccid", "89", "--imsi", "23"}).status, 0);
   EXPECT_TRUE(monitor.wait_for_output("\"sequence\":3"));
+  EXPECT_EQ(call({"sim", "set", "gid1", "7"}).status, 0);
+  EXPECT_EQ(call({"sim", "fail", "gid1", "1", "-5"}).status, 0);
+  EXPECT_EQ(call({"sim", "show"}).out,
+            "sim-status          \"Ready\"\niccid               \"89\"\nimsi                \"23\"\n"
+            "firmware-version    (nothing)\nbootloader-version  (nothing)\ngid1                7  fails with 1.-5\n"
+            "gid2                (nothing)\npostponement        (nothing)\nconnection          succeeds\n");
+  EXPECT_EQ(call({"sim", "clear", "gid1"}).status, 0);
+  EXPECT_EQ(call({"sim", "succeed", "gid1"}).status, 0);
   EXPECT_EQ(call({"sim", "eject"}).status, 0);
   EXPECT_TRUE(monitor.wait_for_output("\"sequence\":4"));
   EXPECT_EQ(call({"sim", "show", "--json"}).out,
@@ -151,6 +181,9 @@ TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
   root.write_file(previous, "one\n");
   root.write_file(kLogFile, "two\n");
   expect_calls({{{"log"}, 0, "one\ntwo\n"}, {{"log", "--json"}, 0, "[\n  \"one\",\n  \"two\"\n]\n"}});
+  root.write_file(kLogFile, "two\033]0;\n");
+  expect_calls({{{"log", "-n", "1"}, 0, "two\\x1b]0;\n"}, {{"log", "-n", "0", "--json"}, 0, "[]\n"}});
+  root.write_file(kLogFile, "two\n");
   Program follower(control_program(), {.arguments = {"log", "--follow"}, .input = {}});
   ASSERT_TRUE(follower.wait_for_output("two\n"));
   std::filesystem::rename(root.path(kLogFile), root.path(previous));
@@ -164,8 +197,15 @@ TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
   }
   follower.send_signal(SIGCONT);
   EXPECT_TRUE(follower.wait_for_output("five\n"));
+  // Cut in place within a line, and grown again beyond the place where the follower stood.
+  root.write_file(kLogFile, "five\nsix is not whole");
+  const std::string longer = "seven is longer than all that stood there before\n";
+  EXPECT_TRUE(eventually([&] { return follower.out().ends_with("five\n"); }));
+  std::this_thread::sleep_for(std::chrono::milliseconds(300));
+  root.write_file(kLogFile, longer);
+  EXPECT_TRUE(follower.wait_for_output("before\n"));
   const Outcome outcome = follower.stop();
-  EXPECT_EQ(outcome.out, "one\ntwo\nthree\nfour\nfive\n");
+  EXPECT_EQ(outcome.out, "one\ntwo\nthree\nfour\nfive\nsix is not whole\n" + longer);
   EXPECT_EQ(outcome.status, 0);
 }
 

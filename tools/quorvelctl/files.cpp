@@ -9,6 +9,7 @@
 #include <cstring>
 
 #include "common/failure.h"
+#include "common/human_text.h"
 #include "platform/descriptor.h"
 #include "platform/file_system.h"
 #include "property/binary/binary.h"
@@ -62,6 +63,10 @@ PropertyValue parse_plist(const std::string& bytes, const std::string& path) {
 bool is_installed_system() {
   const char* root = std::getenv("QUORVEL_ROOT");
   return root == nullptr || std::string_view(root) == "/";
+}
+
+std::string ordinary_path(const std::string& device_path) {
+  return shell_word(is_installed_system() ? device_path : std::getenv("QUORVEL_ROOT") + device_path);
 }
 
 std::string how_to_start(const std::string& program) {

@@ -25,6 +25,9 @@ enum class Links { followed, refused };
 /// True when the device root is the machine's own /: the daemon is then an installed service.
 [[nodiscard]] bool is_installed_system();
 
+/// A path of the device as an ordinary path, quoted for a shell.
+[[nodiscard]] std::string ordinary_path(const std::string& device_path);
+
 /// How the daemon's service is had: "Start quorveld with: systemctl …", or with the same device root.
 [[nodiscard]] std::string how_to_start(const std::string& program);
 

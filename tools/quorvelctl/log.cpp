@@ -1,8 +1,12 @@
 #include <chrono>
+#include <deque>
 #include <thread>
 
 #include "commands.h"
+#include "common/human_text.h"
 #include "common/json.h"
+#include "common/words.h"
+#include "files.h"
 #include "log_files.h"
 #include "output.h"
 
@@ -13,82 +17,109 @@ using namespace std::chrono_literals;
 
 constexpr auto kFollowInterval = 100ms;
 
-// Prints the log as it is, or its lines as JSON texts: one array, or one text a line while following.
+struct LogWords {
+  bool follow = false;
+  std::string count;
+};
+
+// Prints lines as text, or as JSON texts: one array, or one text a line while following.
 class Printer {
  public:
   Printer(bool json, bool follow) : json_(json), follow_(follow) {
     if (json_ && !follow_) write_output("[");
   }
 
-  void print(const std::string& bytes) {
-    if (!json_) return write_output(bytes);
+  void print(const std::deque<std::string>& lines) {
     std::string text;
-    for (const char byte : bytes) {
-      if (byte == '\n') {
-        add_line(text);
-      } else {
-        line_ += byte;
-      }
+    for (const std::string& line : lines) {
+      if (json_ && !follow_) text += first_ ? "\n  " : ",\n  ";
+      text += json_ ? json_string(line) : displayable(line);
+      if (!json_ || follow_) text += '\n';
+      first_ = false;
     }
     write_output(text);
   }
 
-  void finish() {
-    if (!json_) return;
-    std::string text;
-    if (!line_.empty()) add_line(text);
-    write_output(text + (first_ ? "]\n" : "\n]\n"));
+  void finish() const {
+    if (json_ && !follow_) write_output(first_ ? "]\n" : "\n]\n");
   }
 
  private:
-  void add_line(std::string& text) {
-    if (!follow_) text += first_ ? "\n  " : ",\n  ";
-    text += json_string(line_);
-    if (follow_) text += '\n';
-    first_ = false;
-    line_.clear();
-  }
-
   bool json_;
   bool follow_;
   bool first_ = true;
-  std::string line_;
 };
 
-int print_log(bool json, bool follow) {
+// Cuts bytes into lines and keeps the line that is not whole yet.
+class Lines {
+ public:
+  void add(const std::string& bytes, std::deque<std::string>& lines) {
+    for (std::size_t start = 0; start < bytes.size();) {
+      const std::size_t end = std::min(bytes.find('\n', start), bytes.size());
+      open_.append(bytes, start, end - start);
+      if (end < bytes.size()) lines.push_back(std::exchange(open_, {}));
+      start = end + 1;
+    }
+  }
+  void end(std::deque<std::string>& lines) {
+    if (!open_.empty()) lines.push_back(std::exchange(open_, {}));
+  }
+
+ private:
+  std::string open_;
+};
+
+// The log as it is now, or its last lines; a line that is not whole yet stays in `cutter`.
+void print_present(LogFiles& files, Lines& cutter, const LogWords& words, Printer& printer) {
+  const bool last_only = !words.count.empty();
+  const std::size_t most = last_only ? static_cast<std::size_t>(number_of_word(words.count, "-n", 0, 1'000'000)) : 0;
+  std::deque<std::string> lines;
+  for (std::string bytes; !(bytes = files.read()).empty();) {
+    cutter.add(bytes, lines);
+    if (!last_only) printer.print(std::exchange(lines, {}));
+    while (last_only && lines.size() > most) lines.pop_front();
+  }
+  if (!words.follow) cutter.end(lines);
+  while (last_only && lines.size() > most) lines.pop_front();
+  printer.print(lines);
+}
+
+int print_log(const LogWords& words, bool json) {
   LogFiles files;
   if (!files.open()) {
-    if (!follow) {
-      throw Failure{kUnreachable,
-                    "there is no log at /var/mobile/Library/Logs/quorveld.log. Start quorveld with the same "
-                    "device root (--root, QUORVEL_ROOT), then try again"};
+    if (!words.follow) {
+      throw Failure{kUnreachable, std::string("there is no log at ") + kLogFile + ". " + how_to_start("quorveld")};
     }
     note("there is no log yet; waiting for one");
   }
-  if (follow) end_when_interrupted();
-  Printer printer(json, follow);
-  for (;;) {
+  if (words.follow) end_when_interrupted();
+  Printer printer(json, words.follow);
+  Lines cutter;
+  print_present(files, cutter, words, printer);
+  while (words.follow) {
     const std::string bytes = files.read();
-    if (!bytes.empty()) {
-      printer.print(bytes);
-    } else if (follow) {
+    if (bytes.empty()) {
       std::this_thread::sleep_for(kFollowInterval);
-    } else {
-      printer.finish();
-      return kDone;
+      continue;
     }
+    std::deque<std::string> lines;
+    cutter.add(bytes, lines);
+    printer.print(lines);
   }
+  printer.finish();
+  return kDone;
 }
 
 }  // namespace
 
 void add_log(CLI::App& app, CommandLine& line) {
   CLI::App* command = add_command(app, {"log", "Print the daemon's log, the previous generation first",
-                                        "  quorvelctl log | tail -n 20\n"
-                                        "  quorvelctl log --follow"});
-  auto follow = std::make_shared<bool>(false);
-  command->add_flag("--follow,-f", *follow, "Go on printing what is logged, until interrupted");
-  command->callback([&line, follow] { line.run = [&line, follow] { return print_log(line.json, *follow); }; });
+                                        "  quorvelctl log -n 20\n"
+                                        "  quorvelctl log --follow -n 0"});
+  auto words = std::make_shared<LogWords>();
+  command->add_flag("-f,--follow", words->follow, "Go on printing what is logged, until interrupted");
+  add_word(*command, "-n,--lines", words->count, "Of what is there, print the last N lines only")->option_text("N");
+  command->callback([&line, words] { line.run = [&line, words] { return print_log(*words, line.json); }; });
 }
 
 }  // namespace quorvel::tools

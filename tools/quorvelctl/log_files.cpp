@@ -4,7 +4,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <utility>
 
 #include "common/failure.h"
 #include "files.h"
@@ -13,9 +15,8 @@
 namespace quorvel::tools {
 namespace {
 
-constexpr const char* kLog = "/var/mobile/Library/Logs/quorveld.log";
-constexpr const char* kPreviousLog = "/var/mobile/Library/Logs/quorveld.log.1";
 constexpr std::size_t kReadSize = 64u << 10;
+constexpr std::size_t kRemembered = 256;
 
 Descriptor open_log(const char* path) {
   Descriptor file(platform::open_file(path, O_RDONLY | O_NONBLOCK, 0));
@@ -36,13 +37,13 @@ bool same_file(const Descriptor& left, const Descriptor& right) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }
 
-std::string read_some(const Descriptor& file) {
-  std::string bytes(kReadSize, '\0');
+std::string read_at(const Descriptor& file, off_t offset, std::size_t size) {
+  std::string bytes(size, '\0');
   ssize_t count;
   do {
-    count = ::read(file.get(), bytes.data(), bytes.size());
+    count = ::pread(file.get(), bytes.data(), bytes.size(), offset);
   } while (count < 0 && errno == EINTR);
-  if (count < 0) fail_on("read", kLog);
+  if (count < 0) fail_on("read", kLogFile);
   bytes.resize(static_cast<std::size_t>(count));
   return bytes;
 }
@@ -52,21 +53,41 @@ std::string read_some(const Descriptor& file) {
 bool LogFiles::open() {
   // A rotation between the two opens would show one file twice or skip one.
   for (;;) {
-    Descriptor previous = open_log(kPreviousLog);
-    Descriptor newest = open_log(kLog);
-    const Descriptor again = open_log(kPreviousLog);
+    Descriptor previous = open_log(kPreviousLogFile);
+    Descriptor newest = open_log(kLogFile);
+    const Descriptor again = open_log(kPreviousLogFile);
     if (static_cast<bool>(previous) != static_cast<bool>(again) || (previous && !same_file(previous, again))) continue;
-    current_ = previous ? std::move(previous) : std::move(newest);
+    current_ = {previous ? std::move(previous) : std::move(newest), 0, {}};
     following_ = std::move(newest);
-    return static_cast<bool>(current_);
+    return static_cast<bool>(current_.file);
   }
 }
 
+// True when the bytes in front of the offset are others than those that were read: the file was cut, and may have grown
+// again since.
+bool LogFiles::Reading::was_written_anew() const {
+  return read_at(file, offset - static_cast<off_t>(last.size()), last.size()) != last;
+}
+
+std::string LogFiles::Reading::read() {
+  std::string bytes = read_at(file, offset, kReadSize);
+  offset += static_cast<off_t>(bytes.size());
+  last = (last + bytes).substr(last.size() + bytes.size() - std::min(kRemembered, last.size() + bytes.size()));
+  return bytes;
+}
+
 std::string LogFiles::read() {
-  if (!current_ && !open()) return {};
+  if (!current_.file && !open()) return {};
   for (;;) {
-    std::string bytes = read_some(current_);
-    if (!bytes.empty()) return bytes;
+    if (current_.was_written_anew()) {
+      current_ = {std::move(current_.file), 0, {}};
+      if (std::exchange(line_is_open_, false)) return "\n";
+    }
+    std::string bytes = current_.read();
+    if (!bytes.empty()) {
+      line_is_open_ = bytes.back() != '\n';
+      return bytes;
+    }
     const bool waiting = static_cast<bool>(following_);
     move_on();
     if (!waiting && !following_) return {};
@@ -76,16 +97,16 @@ std::string LogFiles::read() {
 // At the end of `current_`: goes on to the file that follows it, or finds out whether one does.
 void LogFiles::move_on() {
   if (following_) {
-    current_ = std::move(following_);
+    current_ = {std::move(following_), 0, {}};
     following_ = Descriptor();
     return;
   }
-  Descriptor newest = open_log(kLog);
-  if (!newest || same_file(newest, current_)) return;
+  Descriptor newest = open_log(kLogFile);
+  if (!newest || same_file(newest, current_.file)) return;
   // After two rotations in a row the file in between is the previous generation by now. What was written to `current_`
   // before it was replaced is read first, on the next turn.
-  Descriptor previous = open_log(kPreviousLog);
-  following_ = previous && !same_file(previous, current_) ? std::move(previous) : std::move(newest);
+  Descriptor previous = open_log(kPreviousLogFile);
+  following_ = previous && !same_file(previous, current_.file) ? std::move(previous) : std::move(newest);
 }
 
 }  // namespace quorvel::tools

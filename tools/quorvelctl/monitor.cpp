@@ -1,11 +1,15 @@
+#include <fnmatch.h>
+
 #include <chrono>
 #include <cstdio>
+#include <thread>
 
 #include "client_failure.h"
 #include "commands.h"
 #include "common/date_text.h"
 #include "common/human_text.h"
 #include "common/json.h"
+#include "common/words.h"
 #include "output.h"
 #include "quorvel/observer.h"
 
@@ -14,24 +18,23 @@ namespace {
 
 using namespace std::chrono_literals;
 
-constexpr auto kEpoch = std::chrono::sys_days{2001y / 1 / 1};
+constexpr auto kRetryInterval = 200ms;
 
-double seconds_now() {
-  const auto now = std::chrono::time_point_cast<std::chrono::milliseconds>(std::chrono::system_clock::now());
-  return std::chrono::duration<double>(now - kEpoch).count();
-}
+struct MonitorWords {
+  std::string name;
+  std::string count;
+};
 
 std::string json_line(const client::Event& event, double time) {
   PropertyValue line = PropertyValue::dictionary(4);
-  bool built = line.set("time", PropertyValue::date(time)) &&
-               line.set("sequence", PropertyValue::unsigned_integer(event.sequence));
+  put(line, "time", PropertyValue::date(time));
+  put(line, "sequence", PropertyValue::unsigned_integer(event.sequence));
   if (event.missed > 0) {
-    built = built && line.set("missed", PropertyValue::unsigned_integer(event.missed));
+    put(line, "missed", PropertyValue::unsigned_integer(event.missed));
   } else {
-    built = built && line.set("name", PropertyValue::string(event.name));
-    if (event.object) built = built && line.set("object", event.object);
+    put(line, "name", PropertyValue::string(event.name));
+    if (event.object) put(line, "object", event.object);
   }
-  if (!built) throw Failure{kUnreachable, "memory does not suffice"};
   return to_json(line, -1) + '\n';
 }
 
@@ -44,29 +47,62 @@ std::string human_line(const client::Event& event, double time) {
            std::to_string(event.sequence) + '\n';
   }
   line.append(colours.strong).append("#" + std::to_string(event.sequence)).append(colours.reset).append("  ");
-  return line.append(colours.key).append(one_line(PropertyValue::string(event.name))).append(colours.reset) + '\n';
+  line.append(colours.key).append(displayable(event.name)).append(colours.reset);
+  const bool says_more = event.object && event.object.text() != event.name;
+  if (says_more) line += "  " + one_line(event.object);
+  return line + '\n';
 }
 
-int run_monitor(bool json) {
+// Connects anew to a daemon that went away, however long that takes.
+void connect_again(client::Observer& observer) {
+  note("the daemon is gone; waiting for it to come back");
+  while (const auto error = observer.connect()) {
+    const bool comes_back = error->code == client::ErrorCode::service_absent ||
+                            error->code == client::ErrorCode::disconnected ||
+                            error->code == client::ErrorCode::timed_out;
+    if (!comes_back) throw unreachable(*error, "the notification center", "quorveld");
+    std::this_thread::sleep_for(kRetryInterval);
+  }
+  note("listening again, after #" + std::to_string(observer.first_sequence()));
+}
+
+int run_monitor(const MonitorWords& words, bool json) {
+  const bool bounded = !words.count.empty();
+  std::int64_t left = bounded ? number_of_word(words.count, "--count", 1, INT64_MAX) : 0;
   end_when_interrupted();
   client::Observer observer;
   if (const auto error = observer.connect()) throw unreachable(*error, "the notification center", "quorveld");
   note("listening for notifications after #" + std::to_string(observer.first_sequence()) + "; Ctrl-C ends it");
-  for (;;) {
+  while (!bounded || left > 0) {
     client::Event event;
-    if (const auto error = observer.next(event, -1ms)) throw unreachable(*error, "the notification center", "quorveld");
+    if (observer.next(event, -1ms)) {
+      connect_again(observer);
+      continue;
+    }
+    const bool wanted = words.name.empty() || ::fnmatch(words.name.c_str(), event.name.c_str(), 0) == 0;
+    if (event.missed == 0 && !wanted) continue;
     const double time = seconds_now();
     write_output(json ? json_line(event, time) : human_line(event, time));
+    if (event.missed == 0) --left;
   }
+  return kDone;
 }
 
 }  // namespace
 
 void add_monitor(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, {"monitor", "Print each posted notification as it arrives, until interrupted",
-                                        "  quorvelctl monitor\n"
-                                        "  quorvelctl monitor --json | jq -r .name"});
-  command->callback([&line] { line.run = [&line] { return run_monitor(line.json); }; });
+  CLI::App* command = add_command(
+      app, {"monitor", "Print each posted notification as it arrives",
+            "  quorvelctl monitor\n"
+            "  quorvelctl monitor --count 1 --name 'com.example.*'\n"
+            "  quorvelctl monitor --json | jq -r .name",
+            "Goes on until it is interrupted, also when the daemon ends and is started again. A reader that "
+            "is too slow is told how many notifications it missed."});
+  auto words = std::make_shared<MonitorWords>();
+  add_word(*command, "--name", words->name, "Only notifications of this name, in which * and ? stand for others")
+      ->option_text("PATTERN");
+  add_word(*command, "--count", words->count, "End after N notifications")->option_text("N");
+  command->callback([&line, words] { line.run = [&line, words] { return run_monitor(*words, line.json); }; });
 }
 
 }  // namespace quorvel::tools

@@ -3,6 +3,8 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <charconv>
+#include <chrono>
 #include <csignal>
 #include <cstring>
 
@@ -47,6 +49,16 @@ int print_value(const PropertyValue& value, const Form& form) {
   return print_value(value, form.json);
 }
 
+int print_change(std::initializer_list<std::pair<std::string_view, std::string>> names, std::string_view key,
+                 const PropertyValue& value, bool json) {
+  if (!json) return kDone;
+  PropertyValue change = PropertyValue::dictionary();
+  // A path may be no valid text; it is shown as well as it can be.
+  for (const auto& [name, text] : names) put(change, name, PropertyValue::string(displayable(text)));
+  if (value) put(change, key, value);
+  return print_value(change, true);
+}
+
 int print_no_value(const std::string& why, bool json) {
   if (json) write_output("null\n");
   note(why);
@@ -63,6 +75,23 @@ PropertyValue value_of_word(const std::string& word, const std::string& what) {
   ParsedJson parsed = parse_json(word);
   if (parsed.error) throw Failure{kWrongWords, what + ": " + *parsed.error};
   return std::move(parsed.value);
+}
+
+std::int64_t number_of_word(const std::string& word, const std::string& what, std::int64_t minimum,
+                            std::int64_t maximum) {
+  std::int64_t result = 0;
+  const auto [end, failure] = std::from_chars(word.data(), word.data() + word.size(), result);
+  if (failure == std::errc{} && end == word.data() + word.size() && result >= minimum && result <= maximum)
+    return result;
+  throw Failure{kWrongWords, what + " is \"" + word + "\", but takes an integer from " + std::to_string(minimum) +
+                                 (maximum == INT64_MAX ? " up" : " to " + std::to_string(maximum))};
+}
+
+double seconds_now() {
+  using namespace std::chrono_literals;
+  constexpr auto kEpoch = std::chrono::sys_days{2001y / 1 / 1};
+  const auto now = std::chrono::time_point_cast<std::chrono::milliseconds>(std::chrono::system_clock::now());
+  return std::chrono::duration<double>(now - kEpoch).count();
 }
 
 void end_when_interrupted() {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <CLI/CLI.hpp>
+#include <cstdint>
 #include <string>
 #include <string_view>
 
@@ -28,6 +29,11 @@ void add_raw(CLI::App& command, bool& raw);
 /// neither bytes nor characters that are unsafe to display. Returns kDone.
 int print_value(const PropertyValue& value, const Form& form);
 
+/// What a command changed, for programs only: with `json` one dictionary of `names`, and of `value` under `key`.
+/// Returns kDone.
+int print_change(std::initializer_list<std::pair<std::string_view, std::string>> names, std::string_view key,
+                 const PropertyValue& value, bool json);
+
 /// For a value that is not there: `null` with `json`, and `why` on standard error. Returns kNoValue.
 int print_no_value(const std::string& why, bool json);
 
@@ -36,6 +42,14 @@ void note(const std::string& text);
 
 /// The value that a word of the call stands for as JSON, none for null. Throws Failure with `what` when it is not JSON.
 [[nodiscard]] PropertyValue value_of_word(const std::string& word, const std::string& what);
+
+/// The integer that a word of the call stands for; throws Failure with `what` when it is none from `minimum` to
+/// `maximum`.
+[[nodiscard]] std::int64_t number_of_word(const std::string& word, const std::string& what, std::int64_t minimum,
+                                          std::int64_t maximum);
+
+/// The present time as dates have it, in whole milliseconds.
+[[nodiscard]] double seconds_now();
 
 /// Has SIGINT and SIGTERM end the process with status 0: for commands that run until they are interrupted and write
 /// whole lines.

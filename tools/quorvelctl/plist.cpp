@@ -25,6 +25,14 @@ int show_file(const std::string& path, bool json) {
   return print_value(parse_plist(read_all(file.get(), path, Place::anywhere), path), json);
 }
 
+// Has the new name survive a power cut as the file does.
+void flush_directory_of(const std::string& path) {
+  const std::filesystem::path parent = std::filesystem::path(path).parent_path();
+  const std::string directory = parent.empty() ? "." : parent.string();
+  const Descriptor descriptor(::open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!descriptor || ::fsync(descriptor.get()) != 0) fail_on("flush", directory, Place::anywhere);
+}
+
 // A file that is there or is to be made is replaced as a whole; anything else, such as a pipe, is written into.
 void write_file(const std::string& given, const std::string& bytes) {
   std::error_code error;
@@ -52,19 +60,20 @@ void write_file(const std::string& given, const std::string& bytes) {
     ::unlink(temporary.c_str());
     throw;
   }
+  flush_directory_of(path);
 }
 
-int write_plist(const std::string& path) {
+int write_plist(const std::string& path, bool json) {
   const PropertyValue value =
       value_of_word(read_all(STDIN_FILENO, "standard input", Place::anywhere), "standard input");
   if (!value) throw Failure{kWrongWords, "standard input: null is no value that a property list can hold"};
   const std::string bytes = plist_bytes(value);
   if (path == kStandardStream) {
     write_output(bytes);
-  } else {
-    write_file(path, bytes);
+    return kDone;
   }
-  return kDone;
+  write_file(path, bytes);
+  return print_change({{"file", path}}, "bytes", PropertyValue::unsigned_integer(bytes.size()), json);
 }
 
 }  // namespace
@@ -92,7 +101,7 @@ void add_plist(CLI::App& app, CommandLine& line) {
   add_word(*write, "FILE", *file, "The file, replaced as a whole; - is standard output")->required();
   write->callback([&line, file] {
     line.uses_root = false;
-    line.run = [file] { return write_plist(*file); };
+    line.run = [&line, file] { return write_plist(*file, line.json); };
   });
 }
 

@@ -8,6 +8,7 @@
 #include <thread>
 
 #include "commands.h"
+#include "common/human_text.h"
 #include "common/words.h"
 #include "files.h"
 #include "output.h"
@@ -28,16 +29,17 @@ struct PreferenceWords {
   std::string domain;
   std::string key;
   std::string json;
+  bool raw = false;
 };
 
 std::string path_of(const std::string& domain) {
-  const bool plain = domain.find('/') == std::string::npos && domain.find('\0') == std::string::npos;
+  const bool plain = domain.find('/') == std::string::npos && displayable(domain) == domain;
   if (!domain.empty() && domain[0] != '.' && plain && domain.size() <= kLongestDomain) {
     return std::string(kDirectory) + '/' + domain + ".plist";
   }
   throw Failure{kWrongWords, "\"" + domain +
                                  "\" cannot be a domain. A domain is a reverse-DNS name of at most 200 "
-                                 "bytes without a slash, such as com.Orvane.quorveld"};
+                                 "bytes without a slash or control character, such as com.Orvane.quorveld"};
 }
 
 std::optional<PropertyValue> read_domain(const std::string& domain) {
@@ -91,31 +93,31 @@ void replace_domain(const std::string& domain, const PropertyValue& values) {
   if (platform::flush_directory(kDirectory) != 0) fail_on("flush", kDirectory);
 }
 
-int list_preferences(const PreferenceWords& words, bool json) {
+std::string command_for(const char* verb, const PreferenceWords& words) {
+  return std::string("quorvelctl preferences ") + verb + ' ' + shell_word(words.domain);
+}
+
+int list_preferences(const PreferenceWords& words, const Form& form) {
   const std::optional<PropertyValue> values = read_domain(words.domain);
-  if (values) return print_value(*values, json);
+  if (values) return print_value(*values, form);
   return print_no_value("the domain \"" + words.domain +
-                            "\" has no preferences. Set one with: quorvelctl preferences "
-                            "set " +
-                            words.domain + " KEY JSON",
-                        json);
+                            "\" has no preferences. Set one with: " + command_for("set", words) + " KEY JSON",
+                        form.json);
 }
 
-int no_such_key(const PreferenceWords& words, bool json) {
+int no_such_key(const PreferenceWords& words, const Form& form) {
   return print_no_value("the domain \"" + words.domain + "\" has no \"" + words.key +
-                            "\". See what it has with: "
-                            "quorvelctl preferences list " +
-                            words.domain,
-                        json);
+                            "\". See what it has with: " + command_for("list", words),
+                        form.json);
 }
 
-int get_preference(const PreferenceWords& words, bool json) {
+int get_preference(const PreferenceWords& words, const Form& form) {
   const std::optional<PropertyValue> values = read_domain(words.domain);
-  if (!values || !values->get(words.key)) return no_such_key(words, json);
-  return print_value(values->get(words.key), json);
+  if (!values || !values->get(words.key)) return no_such_key(words, form);
+  return print_value(values->get(words.key), form);
 }
 
-int set_preference(const PreferenceWords& words) {
+int set_preference(const PreferenceWords& words, const Form& form) {
   const PropertyValue value = value_of_word(words.json, "JSON");
   if (!value) throw Failure{kWrongWords, "null is no value; to take a key away use: quorvelctl preferences delete"};
   const PropertyValue key = PropertyValue::string(words.key);
@@ -123,19 +125,20 @@ int set_preference(const PreferenceWords& words) {
   static_cast<void>(path_of(words.domain));
   const Descriptor lock = lock_directory();
   PropertyValue values = read_domain(words.domain).value_or(PropertyValue::dictionary());
-  if (!values.set(key, value)) throw Failure{kUnreachable, "memory does not suffice"};
+  put(values, words.key, value);
   replace_domain(words.domain, values);
-  return kDone;
+  return print_change({{"domain", words.domain}, {"key", words.key}}, "value", value, form.json);
 }
 
-int delete_preference(const PreferenceWords& words, bool json) {
+int delete_preference(const PreferenceWords& words, const Form& form) {
   const std::optional<PropertyValue> present = read_domain(words.domain);
-  if (!present || !present->get(words.key)) return no_such_key(words, json);
+  if (!present || !present->get(words.key)) return no_such_key(words, form);
   const Descriptor lock = lock_directory();
   PropertyValue values = read_domain(words.domain).value_or(PropertyValue::dictionary());
-  if (!values.remove(words.key)) return no_such_key(words, json);
+  const PropertyValue value = values.get(words.key);
+  if (!values.remove(words.key)) return no_such_key(words, form);
   replace_domain(words.domain, values);
-  return kDone;
+  return print_change({{"domain", words.domain}, {"key", words.key}}, "deleted", value, form.json);
 }
 
 }  // namespace
@@ -153,14 +156,18 @@ void add_preferences(CLI::App& app, CommandLine& line) {
     CLI::App* command = add_command(*preferences, {name, summary, example});
     add_word(*command, "DOMAIN", words->domain, "Reverse-DNS name, such as com.Orvane.quorveld")->required();
     if (key) add_word(*command, "KEY", words->key, "The key")->required();
-    command->callback([&line, words, run] { line.run = [&line, words, run] { return run(*words, line.json); }; });
+    command->callback([&line, words, run] {
+      line.run = [&line, words, run] { return run(*words, Form{line.json, words->raw}); };
+    });
     return command;
   };
   add("list", "Print all of a domain", "  quorvelctl preferences list com.Orvane.quorveld --json", false,
       list_preferences);
-  add("get", "Print one value", "  quorvelctl preferences get com.Orvane.quorveld MachineHack", true, get_preference);
+  CLI::App* get = add("get", "Print one value", "  quorvelctl preferences get com.Orvane.quorveld MachineHack", true,
+                      get_preference);
+  add_raw(*get, words->raw);
   CLI::App* set = add("set", "Set one value", "  quorvelctl preferences set com.Orvane.quorveld MachineHack '\"q35\"'",
-                      true, [](const PreferenceWords& given, bool) { return set_preference(given); });
+                      true, set_preference);
   add_word(*set, "JSON", words->json, "The value as JSON; a text needs its double quotes: '\"text\"'")->required();
   add("delete", "Take one value away", "  quorvelctl preferences delete com.Orvane.quorveld MachineHack", true,
       delete_preference);

@@ -1,8 +1,28 @@
 #include "client_failure.h"
 #include "commands.h"
+#include "files.h"
 #include "output.h"
 
 namespace quorvel::tools {
+
+namespace {
+
+constexpr const char* kFile = "/private/var/mobile/Library/qvd/regulatory_images/regulatory_images.plist";
+
+// The reason as far as the caller can see it from outside.
+std::string why_none() {
+  const std::string path = kFile;
+  try {
+    const std::optional<PropertyValue> images = read_device_plist(path, Links::refused);
+    if (!images) return "Provision them with: quorvelctl plist write " + ordinary_path(path);
+    if (!images->is_dictionary()) return path + " is there, but holds no dictionary";
+    return "See why with: quorvelctl log -n 20";
+  } catch (const Failure& failure) {
+    return failure.message;
+  }
+}
+
+}  // namespace
 
 void add_regulatory_images(CLI::App& app, CommandLine& line) {
   CLI::App* command = add_command(app, {"regulatory-images", "Ask the daemon for the regulatory images and print them",
@@ -13,11 +33,7 @@ void add_regulatory_images(CLI::App& app, CommandLine& line) {
       const client::Reply reply = client::Client().copy_regulatory_images();
       if (reply.error) throw unreachable(*reply.error, "the daemon", "quorveld");
       if (reply.value) return print_value(reply.value, line.json);
-      return print_no_value(
-          "the device has no regulatory images. Provision them as "
-          "/private/var/mobile/Library/qvd/regulatory_images/regulatory_images.plist, for example with: "
-          "quorvelctl plist write",
-          line.json);
+      return print_no_value(std::string("the daemon has no regulatory images to give. ") + why_none(), line.json);
     };
   });
 }

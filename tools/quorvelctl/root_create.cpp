@@ -2,11 +2,12 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
 
 #include "commands.h"
+#include "common/human_text.h"
 #include "common/words.h"
 #include "files.h"
 #include "output.h"
@@ -15,6 +16,8 @@
 
 namespace quorvel::tools {
 namespace {
+
+constexpr const char* kVarTarget = "private/var";
 
 struct RootDirectory {
   const char* path;
@@ -46,16 +49,30 @@ Descriptor make_path(int root, const std::string& path, mode_t mode) {
   return directory;
 }
 
-void make_var_link(int root) {
-  constexpr const char* kTarget = "private/var";
-  if (::symlinkat(kTarget, root, "var") == 0) return;
+// Whether /var of the root is the link that the log's path runs through; nothing stands there yet otherwise.
+bool has_var_link(int root, const std::string& path) {
+  struct stat status {};
+  if (::fstatat(root, "var", &status, AT_SYMLINK_NOFOLLOW) != 0) return false;
   char target[64];
-  const ssize_t length = errno == EEXIST ? ::readlinkat(root, "var", target, sizeof target) : -1;
-  if (length >= 0) {
-    const std::string_view found(target, static_cast<std::size_t>(length));
-    if (found == kTarget || found == "/private/var") return;
+  const ssize_t length = ::readlinkat(root, "var", target, sizeof target);
+  const std::string_view found(target, static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
+  if (found == kVarTarget || found == "/private/var") return true;
+  throw Failure{kUnreachable, path + "/var is there and no link to private/var, so " + path +
+                                  " is no device root. Choose an empty directory"};
+}
+
+// Refuses a directory in which something that is no directory stands where one is needed. Nothing is changed.
+void check_path(int root, const std::string& path, const std::string& below) {
+  for (std::size_t end = below.find('/');; end = below.find('/', end + 1)) {
+    const std::string part = below.substr(0, end);
+    struct stat status {};
+    if (::fstatat(root, part.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return;
+    if (!S_ISDIR(status.st_mode)) {
+      throw Failure{kUnreachable, path + '/' + part + " is no directory, so " + path +
+                                      " is no device root. Choose an empty directory"};
+    }
+    if (end == std::string::npos) return;
   }
-  throw Failure{kUnreachable, "/var of the device root is not the link to private/var; move it out of the way"};
 }
 
 // A sample never replaces a file that is there.
@@ -68,18 +85,43 @@ void make_sample(int root, const SampleFile& sample) {
   if (errno != EEXIST) fail_on("create", path);
 }
 
-int create_root(const std::string& path) {
+// An empty file that says: this device has a telephony service.
+void make_mark(int root) {
+  const Descriptor directory = make_path(root, "etc/quorvel", 0755);
+  const Descriptor file(
+      ::openat(directory.get(), "telephony", O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
+  if (!file && errno != EEXIST) fail_on("create", "etc/quorvel/telephony");
+}
+
+Descriptor open_root(const std::string& path) {
   std::error_code error;
+  if (std::filesystem::weakly_canonical(path, error) == "/") {
+    throw Failure{
+        kWrongWords,
+        "/ is this machine's own root, which the packages of quorveld set up. Choose a directory of your own, "
+        "such as /tmp/device"};
+  }
   std::filesystem::create_directories(path, error);
-  const Descriptor root(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!root) fail_on("open", path);
+  if (error) throw Failure{kUnreachable, "cannot make " + path + ": " + error.message()};
+  Descriptor root(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!root) fail_on("open", path, Place::anywhere);
+  return root;
+}
+
+int create_root(const std::string& path, bool json) {
+  const Descriptor root = open_root(path);
+  const bool has_link = has_var_link(root.get(), path);
+  for (const RootDirectory& directory : kDirectories) check_path(root.get(), path, directory.path);
   for (const RootDirectory& directory : kDirectories) {
     static_cast<void>(make_path(root.get(), directory.path, directory.mode));
   }
-  make_var_link(root.get());
+  if (!has_link && ::symlinkat(kVarTarget, root.get(), "var") != 0) fail_on("make", path + "/var", Place::anywhere);
   for (const SampleFile& sample : kSampleFiles) make_sample(root.get(), sample);
-  note("the device root is ready. Next: QUORVEL_ROOT=$(realpath " + path + ") quorveld");
-  return kDone;
+  make_mark(root.get());
+  std::error_code error;
+  const std::string made = std::filesystem::canonical(path, error).string();
+  note("the device root is ready. Next: QUORVEL_ROOT=" + shell_word(made) + " quorveld");
+  return print_change({{"root", made}}, {}, {}, json);
 }
 
 }  // namespace
@@ -96,7 +138,7 @@ void add_root(CLI::App& app, CommandLine& line) {
   add_word(*create, "DIR", *directory, "The directory, made when it is missing")->required();
   create->callback([&line, directory] {
     line.uses_root = false;
-    line.run = [directory] { return create_root(*directory); };
+    line.run = [&line, directory] { return create_root(*directory, line.json); };
   });
 }
 

@@ -19,6 +19,7 @@ struct NotifyJob {
   std::uint64_t left;
   std::uint64_t serial;
   bool wants_reply;
+  std::uint64_t cut_off = 0;  // observers that did not read meanwhile
 };
 
 class Peer {

@@ -143,7 +143,7 @@ bool Server::start_notify(Peer& peer, const wire::Frame& call, const PropertyVal
   if (!is_telephony_notification(name)) return answer(peer, call, {}, "there is no such notification");
   if (count && !count.to_uint64()) return answer(peer, call, {}, "the count is no positive integer");
   const bool wants_reply = (call.head.flags & wire::kFlagNoReply) == 0;
-  peer.job = NotifyJob{name, count ? *count.to_uint64() : 1, call.head.serial, wants_reply};
+  peer.job = NotifyJob{name, count ? *count.to_uint64() : 1, call.head.serial, wants_reply, 0};
   return true;
 }
 
@@ -165,11 +165,20 @@ void Server::carry_on_jobs() {
         continue;
       }
       const NotifyJob done = *std::exchange(peer->job, std::nullopt);
-      stays = (!done.wants_reply || peer->send(reply_frame(done.serial, {}))) && carry_out_calls(*peer);
+      stays =
+          (!done.wants_reply || peer->send(reply_frame(done.serial, notify_result(done)))) && carry_out_calls(*peer);
       stays = stays && (!peer->ended() || peer->job || peer->has_waiting());
     }
     peer = stays ? std::next(peer) : peers_.erase(peer);
   }
+}
+
+PropertyValue Server::notify_result(const NotifyJob& job) const {
+  const auto observers = std::count_if(peers_.begin(), peers_.end(), [](const Peer& peer) { return !peer.commands; });
+  PropertyValue result = PropertyValue::dictionary(2);
+  const bool built = result.set(wire::kReplyObserversKey.text(), PropertyValue::integer(observers)) &&
+                     result.set(wire::kReplyCutOffKey.text(), PropertyValue::unsigned_integer(job.cut_off));
+  return built ? result : PropertyValue();
 }
 
 void Server::send_event(const std::string& name) {
@@ -182,7 +191,13 @@ void Server::send_event(const std::string& name) {
 
 void Server::drop_the_slow() {
   const auto now = Peer::Clock::now();
-  peers_.remove_if([now](const Peer& peer) { return peer.has_waiting() && peer.deadline() <= now; });
+  const auto is_slow = [now](const Peer& peer) { return peer.has_waiting() && peer.deadline() <= now; };
+  const auto lost =
+      std::count_if(peers_.begin(), peers_.end(), [&](const Peer& peer) { return !peer.commands && is_slow(peer); });
+  for (Peer& peer : peers_) {
+    if (peer.job) peer.job->cut_off += static_cast<std::uint64_t>(lost);
+  }
+  peers_.remove_if(is_slow);
 }
 
 bool Server::observers_keep_up() const {

@@ -32,6 +32,7 @@ class Server {
   [[nodiscard]] bool answer(Peer& peer, const wire::Frame& call, const PropertyValue& value,
                             const std::string& refusal);
   void carry_on_jobs();
+  [[nodiscard]] PropertyValue notify_result(const NotifyJob& job) const;
   void send_event(const std::string& name);
   void drop_the_slow();
   [[nodiscard]] bool observers_keep_up() const;
