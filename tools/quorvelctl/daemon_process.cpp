@@ -56,10 +56,14 @@ Server server_of(std::string_view service) {
   return {Server::State::serving, peer.pid, peer.uid, {}};
 }
 
+std::string user_name(uid_t user) {
+  const passwd* entry = ::getpwuid(user);
+  return entry != nullptr ? entry->pw_name : std::to_string(user);
+}
+
 std::string name_of(const Server& server) {
-  const passwd* entry = ::getpwuid(server.user);
-  const std::string user = entry != nullptr ? entry->pw_name : std::to_string(server.user);
-  return (server.process > 0 ? "process " + std::to_string(server.process) : "a process") + " of user " + user;
+  const std::string process = server.process > 0 ? "process " + std::to_string(server.process) : "a process";
+  return process + " of user " + user_name(server.user);
 }
 
 std::optional<double> start_of(pid_t process) {

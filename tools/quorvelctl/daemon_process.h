@@ -21,6 +21,9 @@ struct Server {
 /// Connects to `service` (its socket's name without the extension) and leaves again.
 [[nodiscard]] Server server_of(std::string_view service);
 
+/// A user's name, or the number of one without a name.
+[[nodiscard]] std::string user_name(uid_t user);
+
 /// "process 12 of user mobile".
 [[nodiscard]] std::string name_of(const Server& server);
 

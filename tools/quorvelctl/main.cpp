@@ -35,6 +35,7 @@ void add_commands(CLI::App& app, CommandLine& line) {
   app.set_version_flag("--version", "quorvelctl " QUORVEL_VERSION, "Print the version and end");
   add_status(app, line);
   add_regulatory_images(app, line);
+  add_facts(app, line);
   add_ark(app, line);
   add_monitor(app, line);
   add_preferences(app, line);
