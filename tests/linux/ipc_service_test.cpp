@@ -1,4 +1,6 @@
 // The IPC service against real clients: well-behaved, odd and hostile.
+#include <thread>
+
 #include "platform/ipc.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
@@ -161,6 +163,25 @@ TEST_F(IpcService, ServesAClientThatEndedItsSending) {
   ASSERT_TRUE(half.send(call("echo", 1).substr(0, 10)));
   half.end_sending();
   EXPECT_TRUE(half.is_closed());
+}
+
+TEST_F(IpcService, AnswersCallsThatAreUnderWayWhenItEnds) {
+  const std::size_t open_before = descriptors_open();
+  SocketPeer fresh = client();
+  SocketPeer halfway = client();
+  const std::string bytes = call("echo", 7, text("hello"));
+  ASSERT_TRUE(halfway.send(bytes.substr(0, 5)));
+  ASSERT_TRUE(eventually([&] { return descriptors_open() == open_before + 4; })) << "both were let in";
+  std::thread ending([&] { stop(); });
+  EXPECT_TRUE(eventually([&] { return !root.exists(std::string("/run/quorvel/") + kSocket); }));
+  ASSERT_TRUE(halfway.send(bytes.substr(5)));
+  ASSERT_TRUE(fresh.send(bytes));
+  for (SocketPeer* peer : {&halfway, &fresh}) {
+    const auto reply = peer->receive();
+    ASSERT_TRUE(reply);
+    EXPECT_EQ(reply->serial, 7u);
+  }
+  ending.join();
 }
 
 TEST_F(IpcService, RunsCallsOfTwoClientsAtOnce) {

@@ -62,6 +62,8 @@ int IpcListener::start() noexcept {
 
 void IpcListener::stop() noexcept {
   socket_.remove_file();
+  // All of them at once, so that none hands a new connection to one that has ended.
+  for (host::IpcWorker& worker : workers_) worker.begin_to_stop();
   for (host::IpcWorker& worker : workers_) worker.stop();
 }
 

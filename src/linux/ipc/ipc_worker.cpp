@@ -22,6 +22,9 @@ namespace {
 constexpr std::int64_t kCallMilliseconds = 10'000;
 constexpr std::int64_t kReplyMilliseconds = 30'000;
 
+// How long a thread that ends goes on for calls that are under way.
+constexpr std::int64_t kFinishMilliseconds = 100;
+
 // How long a thread stays awake for the next call of a client that called before.
 constexpr std::int64_t kAwakeMicroseconds = 50;
 
@@ -52,10 +55,14 @@ bool IpcWorker::start() noexcept {
   return started_;
 }
 
+void IpcWorker::begin_to_stop() noexcept {
+  stopping_.store(true, std::memory_order_release);
+  if (started_) ::eventfd_write(wake_.get(), 1);
+}
+
 void IpcWorker::stop() noexcept {
   if (!started_) return;
-  stopping_.store(true, std::memory_order_release);
-  ::eventfd_write(wake_.get(), 1);
+  begin_to_stop();
   ::pthread_join(thread_, nullptr);
   started_ = false;
 }
@@ -78,6 +85,32 @@ void IpcWorker::run() noexcept {
     free_closed();
     if (listen_again_ != 0 && now_ >= listen_again_) listen();
   }
+  finish();
+}
+
+// Nobody is let in any more, but whoever was let in a moment ago, has begun a call or takes a reply is served: a
+// service that is started again loses no call, because those that were not let in wait in the socket for the next one.
+void IpcWorker::finish() noexcept {
+  epoll_event events[kEventsAtOnce];
+  ::epoll_ctl(epoll_.get(), EPOLL_CTL_DEL, listener_->descriptor(), nullptr);
+  take_in_handed_over();
+  const std::int64_t end = monotonic_milliseconds() + kFinishMilliseconds;
+  for (now_ = monotonic_milliseconds(); has_calls_under_way() && now_ < end; now_ = monotonic_milliseconds()) {
+    const int limit = list_of(Stage::ready).empty() ? static_cast<int>(end - now_) : 0;
+    const int count = ::epoll_wait(epoll_.get(), events, kEventsAtOnce, limit);
+    for (int i = 0; i < count; ++i) {
+      if (events[i].data.ptr != listener_) handle(events[i]);
+    }
+    serve_ready();
+    free_closed();
+  }
+}
+
+bool IpcWorker::has_calls_under_way() const noexcept {
+  for (const Stage stage : {Stage::fresh, Stage::partial, Stage::ready, Stage::sending}) {
+    if (!list_of(stage).empty()) return true;
+  }
+  return false;
 }
 
 // Waking a thread can take longer than a whole call: a client that calls again and again is awaited for a moment

@@ -29,12 +29,14 @@ class IpcWorker {
   /// All connections are closed; the thread must have been stopped.
   ~IpcWorker();
 
-  /// Makes what other workers may use of this one; all are prepared before the first starts. Main thread, as the two
+  /// Makes what other workers may use of this one; all are prepared before the first starts. Main thread, as the three
   /// below. False with errno set.
   [[nodiscard]] bool prepare(IpcListener& listener) noexcept;
   /// Starts the thread. False with errno set.
   [[nodiscard]] bool start() noexcept;
-  /// Stops the thread and waits for its end.
+  /// Tells the thread to end: it lets nobody in any more, and has a tenth of a second for the calls that are under way.
+  void begin_to_stop() noexcept;
+  /// The same, and waits for the thread's end.
   void stop() noexcept;
 
   /// How many connections belong to this worker. Any thread.
@@ -46,6 +48,8 @@ class IpcWorker {
 
   static void* run_thread(void* worker) noexcept;
   void run() noexcept;
+  void finish() noexcept;
+  [[nodiscard]] bool has_calls_under_way() const noexcept;
   [[nodiscard]] int wait_for_events(std::span<epoll_event> events) noexcept;
   void handle(const epoll_event& event) noexcept;
   [[nodiscard]] int wait_limit() const noexcept;
