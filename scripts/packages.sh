@@ -9,6 +9,10 @@ declare -A packages=(
   [coverage]="clang llvm"
   [mutants]="git python3"
   [bench]="libbenchmark-dev pkg-config gnuplot-nox"
+  [package]="dpkg-dev debhelper fakeroot lintian"
+  [cross-arm64]="g++-aarch64-linux-gnu"
+  [elsewhere]="debootstrap"
+  [installed]="debootstrap systemd-container"
   # The contenders of the benchmarks.
   [contenders]="libmsgpack-cxx-dev libglib2.0-dev libabsl-dev libspdlog-dev libsystemd-dev dbus-daemon redis-server"
 )
