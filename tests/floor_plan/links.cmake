@@ -1,0 +1,11 @@
+# The daemon links nothing but the C and C++ libraries. Run as: cmake -DREADELF=<program> -DDAEMON=<program> -P links.cmake
+execute_process(COMMAND ${READELF} -d ${DAEMON} OUTPUT_VARIABLE dynamic COMMAND_ERROR_IS_FATAL ANY)
+string(REGEX MATCHALL "\\(NEEDED\\)[^\n]*" needed "${dynamic}")
+foreach(line IN LISTS needed)
+  if(NOT line MATCHES "(libstdc\\+\\+|libgcc_s|libm|libc|ld-linux-[a-z0-9_-]+)\\.so")
+    message(SEND_ERROR "${DAEMON}: ${line}")
+  endif()
+endforeach()
+if(NOT dynamic MATCHES "\\(FLAGS_1\\)|There is no dynamic section")
+  message(SEND_ERROR "${READELF} told nothing of ${DAEMON}")
+endif()
