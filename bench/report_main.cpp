@@ -1,8 +1,9 @@
-// Prints what was measured, and writes the page and the picture of it.
+// Prints what was measured, and writes the page about it and the data for its picture.
 //
-//   quorvel_bench_report MEASUREMENTS [TEXTS DOCUMENT PICTURE]
+//   quorvel_bench_report MEASUREMENTS [TEXTS DOCUMENT DATA]
 //
-// TEXTS is the folder with the words around the tables.
+// TEXTS is the folder with the words around the tables; into the folder DATA go the files that bench/chart.gnuplot
+// draws.
 #include <fstream>
 #include <iostream>
 #include <iterator>
@@ -10,7 +11,6 @@
 #include <stdexcept>
 #include <string>
 
-#include "bench/support/chart.h"
 #include "bench/support/table.h"
 
 namespace quorvel::bench {
@@ -34,6 +34,37 @@ void write_document(const Measurements& measurements, const std::string& texts, 
   out << tail.substr(mark + kMark.size());
 }
 
+// The cost of a call is drawn for rates too: less is better in every bar.
+double cost(const Goal& goal, double ratio) { return goal.told == Told::at_most ? ratio : 1 / ratio; }
+
+std::string plain(std::string text) {
+  std::erase(text, '`');
+  return text;
+}
+
+// A row a work: title, ratio, goal, whether it is met.
+void write_bars(const Measurements& measurements, std::ostream& out) {
+  for (const Result& result : results(measurements)) {
+    if (!result.to_rival) continue;
+    const Goal& goal = *result.goal;
+    out << plain(goal.title) << '\t' << cost(goal, *result.to_rival) << '\t' << cost(goal, goal.bound) << '\t'
+        << (result.met() ? "yes" : "no") << '\n';
+  }
+}
+
+// A block a work: its title, then a row a size.
+void write_growth(const Measurements& measurements, std::ostream& out) {
+  for (const Growth& growth : growths()) {
+    const std::vector<GrowthPoint> points = growth_of(measurements, growth.work, kOurs);
+    if (points.size() < 2) continue;
+    out << '"' << growth.title << "\"\n";
+    for (const GrowthPoint& point : points) {
+      out << point.entries << '\t' << point.to_base << '\n';
+    }
+    out << "\n\n";
+  }
+}
+
 template <class Write>
 void write_to(const std::string& path, Write write) {
   std::ofstream file(path);
@@ -43,7 +74,7 @@ void write_to(const std::string& path, Write write) {
 
 int run(int argc, char** argv) {
   if (argc != 2 && argc != 5) {
-    std::cerr << "Usage: quorvel_bench_report MEASUREMENTS [TEXTS DOCUMENT PICTURE]\n";
+    std::cerr << "Usage: quorvel_bench_report MEASUREMENTS [TEXTS DOCUMENT DATA]\n";
     return 2;
   }
   Measurements measurements;
@@ -52,7 +83,9 @@ int run(int argc, char** argv) {
   print_growth(measurements, TableForm::aligned, std::cout << '\n');
   if (argc == 2) return 0;
   write_to(argv[3], [&](std::ostream& out) { write_document(measurements, argv[2], out); });
-  write_to(argv[4], [&](std::ostream& out) { draw(measurements, out); });
+  const std::string data = argv[4];
+  write_to(data + "/bars.tsv", [&](std::ostream& out) { write_bars(measurements, out); });
+  write_to(data + "/growth.tsv", [&](std::ostream& out) { write_growth(measurements, out); });
   return 0;
 }
 

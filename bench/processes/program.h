@@ -18,8 +18,8 @@ class StartedProgram {
   [[nodiscard]] virtual std::vector<std::string> command() const = 0;
 };
 
-/// The daemon with 100, 10,000 and 100,000 entries, and the peers that are installed: dbus-daemon, which holds no data,
-/// and redis-server with as many entries.
+/// The daemon with 100, 10,000 and 100,000 entries, and the contenders that are installed: dbus-daemon, which holds no
+/// data, and redis-server with as many entries.
 [[nodiscard]] std::vector<std::unique_ptr<StartedProgram>> make_programs();
 
 }  // namespace quorvel::bench

@@ -1,5 +1,5 @@
-// A peer of the daemon: answers a method call over sd-bus, peer to peer, by reading a msgpack file, decoding it and
-// encoding the reply.
+// A contender of the daemon: answers a method call over sd-bus, peer to peer, by reading a msgpack file, decoding it
+// and encoding the reply.
 //
 //   bench_sd_bus_server SOCKET FILE
 #include <sys/epoll.h>

@@ -74,7 +74,7 @@ std::vector<std::unique_ptr<Service>> make_services() {
   std::vector<std::unique_ptr<Service>> services;
   services.push_back(std::make_unique<DaemonService>());
   services.push_back(std::make_unique<BareService>());
-  if (auto peer = make_sd_bus_service()) services.push_back(std::move(peer));
+  if (auto contender = make_sd_bus_service()) services.push_back(std::move(contender));
   return services;
 }
 

@@ -1,4 +1,4 @@
-// Whole files by the plain system calls, for peers and limits. Everything throws when a call fails.
+// Whole files by the plain system calls, for contenders and limits. Everything throws when a call fails.
 #pragma once
 
 #include <sys/types.h>

@@ -84,11 +84,11 @@ std::vector<Result> results(const Measurements& measurements) {
         result.to_limit = ratio(value);
         continue;
       }
-      if (contender == goal.peer) result.to_peer = ratio(value);
+      if (contender == goal.rival) result.to_rival = ratio(value);
       if (value >= best) continue;
       best = value;
-      result.best_peer = contender;
-      result.to_best_peer = ratio(value);
+      result.best_contender = contender;
+      result.to_best_contender = ratio(value);
     }
     results.push_back(std::move(result));
   }

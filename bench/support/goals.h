@@ -21,7 +21,7 @@ struct Goal {
   const char* work;
   std::size_t entries;
   const char* title;
-  const char* peer;  // against whom the goal was set
+  const char* rival;  // against whom the goal was set
   double bound;
   Told told = Told::at_most;
   Statistic statistic = Statistic::fastest;
@@ -32,12 +32,12 @@ struct Goal {
 /// A goal with what was measured. Ratios are none when one of the two was not measured.
 struct Result {
   const Goal* goal;
-  std::string best_peer;
+  std::string best_contender;
   std::optional<double> to_limit;
-  std::optional<double> to_peer;       // that of the goal
-  std::optional<double> to_best_peer;  // of all that were measured
+  std::optional<double> to_rival;           // that of the goal
+  std::optional<double> to_best_contender;  // of all that were measured
   [[nodiscard]] bool met() const {
-    return to_peer && (goal->told == Told::at_most ? *to_peer <= goal->bound : *to_peer >= goal->bound);
+    return to_rival && (goal->told == Told::at_most ? *to_rival <= goal->bound : *to_rival >= goal->bound);
   }
 };
 

@@ -50,15 +50,17 @@ std::string goal_text(const Goal& goal) {
 }  // namespace
 
 void print_results(const Measurements& measurements, TableForm form, std::ostream& out) {
-  std::vector<Row> rows{{"work", "peer", "ratio to limit", "ratio to peer", "ratio to best peer", "goal", "met"}};
+  std::vector<Row> rows{
+      {"work", "rival", "ratio to limit", "ratio to rival", "ratio to best contender", "goal", "met"}};
   for (const Result& result : results(measurements)) {
-    std::string best = number(result.to_best_peer);
-    if (result.to_best_peer && result.best_peer != result.goal->peer) best += " (" + result.best_peer + ")";
-    rows.push_back({result.goal->title, result.goal->peer, number(result.to_limit), number(result.to_peer), best,
+    std::string best = number(result.to_best_contender);
+    if (result.to_best_contender && result.best_contender != result.goal->rival)
+      best += " (" + result.best_contender + ")";
+    rows.push_back({result.goal->title, result.goal->rival, number(result.to_limit), number(result.to_rival), best,
                     goal_text(*result.goal),
-                    !result.to_peer ? "–"
-                    : result.met()  ? "yes"
-                                    : "no"});
+                    !result.to_rival ? "–"
+                    : result.met()   ? "yes"
+                                     : "no"});
   }
   print(rows, form, out);
 }

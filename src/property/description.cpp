@@ -18,7 +18,7 @@ namespace {
 constexpr std::string_view kDigits = "0123456789abcdef";
 constexpr std::size_t kDescribedBytes = 16;
 // Seconds from 0000-01-01 and to 9999-12-31T23:59:59, counted from 2001: the years that four digits name.
-constexpr double kFirstDate = -63'145'440'000.0;
+constexpr double kFirstDate = -63'145'526'400.0;
 constexpr double kLastDate = 252'423'993'600.0;
 constexpr double kSecondsADay = 86'400.0;
 

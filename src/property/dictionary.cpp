@@ -57,13 +57,15 @@ void forget_order(DictionaryNode& dictionary) noexcept {
   std::free(dictionary.order.exchange(nullptr, std::memory_order_relaxed));
 }
 
-// Closes the gaps, so that every entry is live. The index is made anew, as the entries' places change.
+// Closes the gaps, so that every entry is live. The entries' places change: the index is made anew, and an order that
+// was noted is forgotten. False, and nothing changed, when memory runs out.
 bool compact(DictionaryNode& dictionary) noexcept {
   IndexSlot* index = nullptr;
   if (dictionary.index_size > 0) {
     index = static_cast<IndexSlot*>(std::calloc(dictionary.index_size, sizeof(IndexSlot)));
     if (index == nullptr) return false;
   }
+  forget_order(dictionary);
   std::uint32_t kept = 0, ascending = 0;
   for (std::uint32_t i = 0; i < dictionary.used; ++i) {
     if (i == dictionary.ascending) ascending = kept;

@@ -121,6 +121,12 @@ TEST(Binary, RefusesWhatIsNoPropertyList) {
       EXPECT_FALSE(decoded(file)) << at << " of " << length;
     }
   }
+  // With unused bytes between the last object and the table, no object is near the end.
+  const std::string unused(60, '\0');
+  const std::string far_table = file_of({"d1 01 02", "51 'a'", "52 fffe"});
+  std::string spaced = far_table.substr(0, 16) + unused + far_table.substr(16);
+  spaced.back() = static_cast<char>(spaced.back() + 60);
+  EXPECT_FALSE(decoded(spaced));
   std::string long_text = encoded(text(std::string(5000, 'a')));
   long_text[4000] = '\x80';
   EXPECT_FALSE(decoded(long_text));
@@ -150,8 +156,30 @@ TEST(Binary, EqualValuesGiveEqualBytes) {
   }
   for (int i = 0; i < 500; ++i) EXPECT_TRUE(down.remove("gone" + std::to_string(i)));
   EXPECT_EQ(up, down);
+  // Entries that were removed do not count among those that make a dictionary large, behind enough other values.
+  PropertyValue others = PropertyValue::array(), same = PropertyValue::dictionary(),
+                shrunk = PropertyValue::dictionary();
+  for (int i = 0; i < 600; ++i) {
+    ASSERT_TRUE(others.append(PropertyValue::integer(i)));
+    ASSERT_TRUE(shrunk.set(std::to_string(i), PropertyValue::integer(i % 200)));
+  }
+  for (int i = 200; i < 600; ++i) EXPECT_TRUE(shrunk.remove(std::to_string(i)));
+  for (int i = 0; i < 200; ++i) ASSERT_TRUE(same.set(std::to_string(i), PropertyValue::integer(i)));
+  EXPECT_EQ(encoded(array({others, shrunk})), encoded(array({others, same})));
   EXPECT_EQ(encoded(up), encoded(down));
   EXPECT_EQ(encoded(decoded(encoded(up))), encoded(up));
+}
+
+TEST(Binary, ABufferThatIsUsedAgainKeepsItsSize) {
+  ByteBuffer out;
+  const PropertyValue value = dictionary({{"key", "value"}});
+  ASSERT_TRUE(write_binary(value, out));
+  const std::size_t capacity = out.capacity();
+  for (int i = 0; i < 20; ++i) {
+    out.clear();
+    ASSERT_TRUE(write_binary(value, out));
+  }
+  EXPECT_EQ(out.capacity(), capacity);
 }
 
 TEST(Binary, ReferencesAreAsSmallAsTheyCanBe) {

@@ -107,6 +107,8 @@ TEST(Description, IsOneLineThatAReaderUnderstands) {
       {PropertyValue::date(-978'307'200), "1970-01-01T00:00:00Z"},
       {PropertyValue::date(99'792'000.25), "2004-03-01T00:00:00.250Z"},
       {PropertyValue::date(252'423'993'599), "9999-12-31T23:59:59Z"},
+      {PropertyValue::date(-63'145'526'400), "0000-01-01T00:00:00Z"},
+      {PropertyValue::date(-63'145'526'401), "date -63145526401.0"},
       {PropertyValue::date(1e300), "date 1e+300"},
       {data(""), "<0 bytes>"},
       {data("\x89PNG"), "<89504e47 4 bytes>"},

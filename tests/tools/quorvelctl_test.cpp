@@ -176,6 +176,28 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   EXPECT_EQ(none.out, "null\n");
 }
 
+TEST_F(Quorvelctl, TellsHowTheDaemonIs) {
+  const auto expect_status = [](int status, const std::string& part) {
+    const Outcome outcome = run_to_end(control_program(), {"status"});
+    EXPECT_EQ(outcome.status, status) << outcome.out << outcome.err;
+    EXPECT_NE(outcome.out.find(part), std::string::npos) << outcome.out;
+  };
+  expect_status(3, "daemon     not running. Start quorveld");
+  root.write_file("/etc/quorvel/telephony", "");
+  Program simulator(simulator_program());
+  ASSERT_TRUE(simulator.wait_for_output("ready"));
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  EXPECT_TRUE(eventually([] { return run_to_end(control_program(), {"status"}).status == 0; }));
+  expect_status(0, "telephony  followed, served by process " + std::to_string(simulator.pid()));
+  expect_status(0, "daemon     running, process " + std::to_string(daemon.pid()));
+  simulator.stop();
+  EXPECT_TRUE(eventually([] { return run_to_end(control_program(), {"status"}).status == 1; }));
+  expect_status(1, "telephony  not followed: nothing is at /run/quorvel/telvane.sock");
+  root.write_file(kDataFile, "garbage");
+  expect_status(1, "does not hold a binary property list");
+}
+
 TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
   const std::string previous = std::string(kLogFile) + ".1";
   root.write_file(previous, "one\n");

@@ -12,7 +12,7 @@ namespace quorvel::tools {
 namespace {
 
 constexpr Palette kPlain{};
-constexpr Palette kColours{"\x1b[36m", "\x1b[2m", "\x1b[1m", "\x1b[0m"};
+constexpr Palette kColours{"\x1b[36m", "\x1b[2m", "\x1b[1m", "\x1b[1;31m", "\x1b[0m"};
 
 bool wants_colours() {
   const char* terminal = std::getenv("TERM");

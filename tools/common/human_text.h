@@ -10,7 +10,7 @@ namespace quorvel::tools {
 
 /// Which texts stand out on a terminal; every one is empty elsewhere.
 struct Palette {
-  std::string_view key, quiet, strong, reset;
+  std::string_view key, quiet, strong, warning, reset;
 };
 
 /// The palette for standard output.

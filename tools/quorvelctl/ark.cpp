@@ -100,7 +100,7 @@ int list_entries(const ArkWords& words, bool json) {
 
 int get_key(const ArkWords& words, const Form& form) {
   const LiveAnswer live = live_answer(words.domain, words.has_domain, words.key);
-  if (live.is_live) {
+  if (live.row != nullptr) {
     if (live.value) return print_value(live.value, form);
     return print_no_value("\"" + words.key +
                               "\" is answered live, and this device does not know it. An administrator can give it in "

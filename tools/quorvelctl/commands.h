@@ -22,6 +22,8 @@ struct CommandLine {
 };
 
 void add_regulatory_images(CLI::App& app, CommandLine& line);
+void add_status(CLI::App& app, CommandLine& line);
+void add_facts(CLI::App& app, CommandLine& line);
 void add_ark(CLI::App& app, CommandLine& line);
 void add_monitor(CLI::App& app, CommandLine& line);
 void add_preferences(CLI::App& app, CommandLine& line);

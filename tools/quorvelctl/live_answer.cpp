@@ -6,11 +6,11 @@
 namespace quorvel::tools {
 
 LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::string& key) {
-  constexpr int kQuestion = 0;
-  const PropertyValue question =
-      larry_lookup(has_domain ? PropertyValue::string(domain) : PropertyValue(), PropertyValue::string(key), kQuestion);
-  if (!question) return {};
-  return {true, platform::copy_device_answer(question.text())};
+  const larry_info* row =
+      find_live_answer(has_domain ? PropertyValue::string(domain) : PropertyValue(), PropertyValue::string(key));
+  return row == nullptr ? LiveAnswer() : live_answer(*row);
 }
+
+LiveAnswer live_answer(const larry_info& row) { return {&row, platform::copy_device_answer(row.question), "", ""}; }
 
 }  // namespace quorvel::tools

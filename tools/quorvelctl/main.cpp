@@ -33,7 +33,9 @@ void add_commands(CLI::App& app, CommandLine& line) {
   add_word(app, "--root", line.root, kRootHelp)->option_text("DIR");
   app.add_flag("--json", line.json, "Print JSON, for programs");
   app.set_version_flag("--version", "quorvelctl " QUORVEL_VERSION, "Print the version and end");
+  add_status(app, line);
   add_regulatory_images(app, line);
+  add_facts(app, line);
   add_ark(app, line);
   add_monitor(app, line);
   add_preferences(app, line);

@@ -8,6 +8,7 @@
 #include "common/words.h"
 #include "output.h"
 #include "sim_calls.h"
+#include "sim_record.h"
 #include "wire/telephony_state.h"
 
 namespace quorvel::tools {
@@ -189,6 +190,15 @@ void add_event_commands(CLI::App& sim, CommandLine& line, const Words& words) {
                          insert_sim);
   add_word(*insert, "--iccid", words->iccid, "The card's identity")->required()->option_text("S");
   add_word(*insert, "--imsi", words->imsi, "The subscriber's identity")->required()->option_text("S");
+  CLI::App* record = add(
+      sim, line, words,
+      {"record", "Write down what a telephony service tells, until interrupted",
+       "  quorvelctl sim record modem.jsonl\n"
+       "  telvane-sim --replay modem.jsonl --speed 10",
+       "Follows the service as the daemon does, the simulator or a real one, and writes a line of JSON for each state "
+       "and event with its time: {\"time\": ..., \"event\": NAME, \"state\": {...}}. The simulator plays them again."},
+      [](const SimWords& given, bool) { return record_service(given.file); });
+  add_word(*record, "FILE", words->file, "The file, written anew; - is standard output")->required();
   add(sim, line, words, {"eject", "Take the SIM out, and send the notification", "  quorvelctl sim eject"}, eject_sim);
 }
 

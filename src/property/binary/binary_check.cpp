@@ -46,14 +46,15 @@ class Checker {
     if (depths_ == nullptr) return false;
     depths_[0] = 1;
     std::uint64_t i = 0, end = format::kHeader.size();
-    for (; check_short_leaves(i, end) && i < layout_.count(); ++i) {
+    for (;; ++i) {
+      if (!check_short_leaves(i, end)) return false;
+      if (i == layout_.count()) break;
       const std::uint64_t offset = layout_.offset_of(i);
       EncodedObject object;
       if (offset < end || !layout_.object_at(offset, object)) return false;
       end = layout_.offset_at(object.end);
       if (!(object.is_container() ? check_container(i, object) : is_valid_leaf(object))) return false;
     }
-    if (i < layout_.count()) return false;
     EncodedObject top;
     return layout_.object_at(layout_.offset_of(0), top) && top.kind == format::kDictionary;
   }

@@ -51,6 +51,12 @@ void fetch_elements(const ContainerNode& container) noexcept {
   for (std::size_t i = 0; i < std::min(count, kFetchAhead); ++i) fetch(words[i]);
 }
 
+// Entries that were removed do not count: equal values give equal bytes.
+std::size_t element_count(const ContainerNode& container) noexcept {
+  return container.kind == PropertyKind::dictionary ? static_cast<const DictionaryNode&>(container).live
+                                                    : container.used;
+}
+
 // The keys, or the values, of a dictionary in their order.
 template <Word Entry::*part>
 class EntryRow {
@@ -180,8 +186,10 @@ bool grow_row(T*& row, std::size_t& room, std::size_t larger) noexcept {
 std::byte* Writer::grow(std::byte* at, std::size_t room) noexcept {
   const std::size_t used = start_ == nullptr ? 0 : static_cast<std::size_t>(at - start_);
   if (room > kLargestFile - used) return nullptr;
-  const std::size_t larger = std::min(std::max(used + room, (out_.capacity() - before_) * 2), kLargestFile);
-  if (!out_.reserve(before_ + larger)) return nullptr;
+  // A buffer that is used again keeps its memory as long as that suffices.
+  const std::size_t needed = before_ + used + room;
+  const std::size_t likely = std::min(std::max(needed, out_.capacity() * 2), before_ + kLargestFile);
+  if (needed > out_.capacity() && !out_.reserve(likely)) return nullptr;
   start_ = out_.data() + before_;
   end_ = start_ + std::min(out_.capacity() - before_, kLargestFile);
   return start_ + used;
@@ -367,7 +375,7 @@ bool Writer::put_objects() noexcept {
     }
     if (i + 2 < queued_) fetch_elements(*queue_[i + 2].container);
     next_reference_ = queue_[i].references;
-    if (queue_[i].container->used > kCredit) value_credit_ = std::max(value_credit_, kCredit);
+    if (element_count(*queue_[i].container) > kCredit) value_credit_ = std::max(value_credit_, kCredit);
     at = add_elements(at, *queue_[i].container);
   }
   if (at == nullptr) return false;

@@ -1,0 +1,127 @@
+#include "facts_text.h"
+
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "common/failure.h"
+#include "common/human_text.h"
+
+namespace quorvel::tools {
+namespace {
+
+constexpr std::size_t kUsualWidth = 80;
+constexpr std::size_t kIndent = 2;
+constexpr std::size_t kGap = 2;
+
+// Characters, so that columns stay straight where a text has letters of more than one byte.
+std::size_t columns_of(std::string_view text) {
+  return static_cast<std::size_t>(std::count_if(
+      text.begin(), text.end(), [](char byte) { return (static_cast<unsigned char>(byte) & 0xc0) != 0x80; }));
+}
+
+std::string source_of(const LiveAnswer& fact) {
+  const std::string kind(kind_name(fact.value.kind()));
+  return fact.origin.empty() ? kind : kind + ", " + displayable(fact.origin);
+}
+
+std::string value_of(const LiveAnswer& fact) {
+  if (!fact.value) return "(no answer)";
+  return one_line(fact.value) + (fact.unit.empty() ? "" : " " + std::string(fact.unit));
+}
+
+struct Columns {
+  std::size_t width, value, source;
+};
+
+// Sources stand in one column behind the longest value that leaves them their place.
+Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
+  std::size_t key = 0, value = 0, source = 0;
+  for (const LiveAnswer& fact : facts) {
+    key = std::max(key, fact.row->key.size());
+    source = std::max(source, columns_of(source_of(fact)));
+  }
+  const std::size_t start = kIndent + key + kGap;
+  for (const LiveAnswer& fact : facts) {
+    const std::size_t columns = columns_of(value_of(fact));
+    if (start + columns + kGap + source <= width) value = std::max(value, columns);
+  }
+  return {width, start, start + value + kGap};
+}
+
+void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& text) {
+  const Palette& colours = palette();
+  const std::string_view key = fact.row->key;
+  const std::string value = value_of(fact);
+  text.append(kIndent, ' ').append(colours.key).append(key).append(colours.reset);
+  text.append(columns.value - kIndent - key.size(), ' ');
+  text.append(fact.value ? std::string_view() : colours.quiet).append(value);
+  const std::size_t end = columns.value + columns_of(value);
+  if (!fact.value) {
+    text.append(colours.reset).append("\n");
+    return;
+  }
+  const std::string source = source_of(fact);
+  if (end + kGap <= columns.source) {
+    text.append(columns.source - end, ' ');
+  } else if (end + kGap + columns_of(source) <= columns.width) {
+    text.append(kGap, ' ');
+  } else {
+    text.append("\n").append(columns.value, ' ');
+  }
+  text.append(colours.quiet).append(source).append(colours.reset).append("\n");
+}
+
+}  // namespace
+
+std::string_view kind_name(PropertyKind kind) {
+  switch (kind) {
+    case PropertyKind::none: return "none";
+    case PropertyKind::boolean: return "boolean";
+    case PropertyKind::integer: return "integer";
+    case PropertyKind::real: return "real";
+    case PropertyKind::date: return "date";
+    case PropertyKind::string: return "text";
+    case PropertyKind::data: return "data";
+    case PropertyKind::array: return "array";
+    case PropertyKind::dictionary: return "dictionary";
+  }
+  return "";
+}
+
+std::string facts_text(const std::vector<LiveAnswer>& facts, std::size_t width) {
+  const Palette& colours = palette();
+  const Columns columns = columns_for(facts, width);
+  std::string text;
+  std::string_view domain;
+  for (std::size_t i = 0; i < facts.size(); ++i) {
+    if (i == 0 || facts[i].row->domain != domain) {
+      domain = facts[i].row->domain;
+      text.append(i == 0 ? "" : "\n").append(colours.strong);
+      text.append(domain.empty() ? "Without a domain" : domain).append(colours.reset).append("\n");
+    }
+    append_fact(facts[i], columns, text);
+  }
+  return text;
+}
+
+PropertyValue fact_value(const LiveAnswer& fact) {
+  PropertyValue result = PropertyValue::dictionary(6);
+  put(result, "key", PropertyValue::string(fact.row->key));
+  if (!fact.row->domain.empty()) put(result, "domain", PropertyValue::string(fact.row->domain));
+  if (!fact.value) return result;
+  put(result, "value", fact.value);
+  put(result, "kind", PropertyValue::string(kind_name(fact.value.kind())));
+  if (!fact.unit.empty()) put(result, "unit", PropertyValue::string(fact.unit));
+  if (!fact.origin.empty()) put(result, "origin", PropertyValue::string(fact.origin));
+  return result;
+}
+
+std::size_t terminal_width() {
+  winsize size{};
+  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) != 0 || size.ws_col < 40) return kUsualWidth;
+  return size.ws_col;
+}
+
+}  // namespace quorvel::tools

@@ -1,0 +1,25 @@
+// The facts of a device for a reader and for a program.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "live_answer.h"
+
+namespace quorvel::tools {
+
+/// The name of a value's kind, as people say it.
+[[nodiscard]] std::string_view kind_name(PropertyKind kind);
+
+/// Facts by domain, keys and values in columns, each with its kind and origin, which go onto a line of their own where
+/// they do not fit into `width` columns.
+[[nodiscard]] std::string facts_text(const std::vector<LiveAnswer>& facts, std::size_t width);
+
+/// One fact as a dictionary: "key", "domain" if it has one, and if there is an answer "value", "kind", "unit",
+/// "origin".
+[[nodiscard]] PropertyValue fact_value(const LiveAnswer& fact);
+
+/// How wide standard output's terminal is; 80 elsewhere.
+[[nodiscard]] std::size_t terminal_width();
+
+}  // namespace quorvel::tools

@@ -1,0 +1,183 @@
+#include "status_checks.h"
+
+#include <sys/stat.h>
+
+#include <chrono>
+#include <cstdio>
+#include <optional>
+#include <utility>
+
+#include "common/failure.h"
+#include "common/human_text.h"
+#include "files.h"
+#include "log_files.h"
+#include "output.h"
+#include "platform/file_system.h"
+#include "quorvel/client.h"
+#include "saved_ark.h"
+
+namespace quorvel::tools {
+namespace {
+
+using namespace std::chrono_literals;
+
+constexpr double kEpoch = 978'307'200;  // 2001, in seconds since 1970
+constexpr auto kPatience = 2s;
+constexpr std::size_t kLongestLine = 64u << 10;
+constexpr const char* kMark = "/etc/quorvel/telephony";
+constexpr const char* kSocket = "/run/quorvel/telvane.sock";
+
+std::string duration_text(double seconds) {
+  const std::pair<double, const char*> units[] = {{86'400, "day"}, {3'600, "hour"}, {60, "minute"}, {1, "second"}};
+  for (const auto& [length, name] : units) {
+    const auto count = static_cast<long long>(seconds / length);
+    if (count > 0) return std::to_string(count) + ' ' + name + (count == 1 ? "" : "s");
+  }
+  return "less than a second";
+}
+
+std::string since_text(double date) {
+  return one_line(PropertyValue::date(date)) + ", " + duration_text(seconds_now() - date) + " ago";
+}
+
+bool exists(const char* path, struct stat* status) { return platform::file_status(path, status) == 0; }
+
+// Why the daemon does not follow the service that is there or should be, as far as one sees from outside.
+std::string why_not_followed(const Server& service, bool marked) {
+  struct stat directory {};
+  if (service.state == Server::State::absent) {
+    struct stat socket {};
+    return exists(kSocket, &socket) ? std::string("nobody serves ") + kSocket + ", which is there"
+                                    : std::string("nothing is at ") + kSocket + ": the service does not run";
+  }
+  const bool foreign = service.state == Server::State::serving && exists("/run/quorvel", &directory) &&
+                       service.user != 0 && service.user != directory.st_uid;
+  if (foreign) return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
+  if (!marked) return std::string("the daemon may have started without it: make ") + kMark + " and restart the daemon";
+  return is_installed_system() ? "the daemon says why with: journalctl -u quorveld"
+                               : "the daemon says why on its standard error";
+}
+
+}  // namespace
+
+Finding check_calls() {
+  client::Options options;
+  options.timeout = kPatience;
+  const auto start = std::chrono::steady_clock::now();
+  // There is no such operation: that the daemon says so is an answer, and nothing else happens.
+  const client::Reply reply = client::Client(options).call("status", {});
+  const auto milliseconds = std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start).count();
+  Finding finding{"calls", Verdict::well, {}, PropertyValue::dictionary()};
+  const bool answered = reply.error && reply.error->code == client::ErrorCode::service_failure;
+  put(finding.facts, "ready", PropertyValue::boolean(answered));
+  if (answered) {
+    char text[64];
+    std::snprintf(text, sizeof text, "answered in %.1f ms", milliseconds);
+    finding.lines.emplace_back(text);
+    put(finding.facts, "milliseconds", PropertyValue::real(milliseconds));
+  } else {
+    finding.verdict = Verdict::ill;
+    finding.lines.push_back("not answered: " + (reply.error ? reply.error->description : std::string("no reply")));
+  }
+  return finding;
+}
+
+Finding check_daemon(const Server& daemon) {
+  Finding finding{"daemon", Verdict::well, {}, PropertyValue::dictionary()};
+  const bool running = daemon.state == Server::State::serving || daemon.state == Server::State::refused;
+  put(finding.facts, "running", PropertyValue::boolean(running));
+  if (!running) {
+    finding.verdict = daemon.state == Server::State::absent ? Verdict::absent : Verdict::ill;
+    finding.lines.push_back(daemon.state == Server::State::absent ? "not running. " + how_to_start("quorveld")
+                                                                  : daemon.reason);
+    return finding;
+  }
+  finding.lines.push_back("running, " + name_of(daemon));
+  if (daemon.process > 0) put(finding.facts, "process", PropertyValue::integer(daemon.process));
+  put(finding.facts, "user", PropertyValue::integer(daemon.user));
+  if (const std::optional<double> start = daemon.process > 0 ? start_of(daemon.process) : std::nullopt) {
+    finding.lines.push_back("since " + since_text(*start - kEpoch));
+    put(finding.facts, "since", PropertyValue::date(*start - kEpoch));
+  }
+  return finding;
+}
+
+Finding check_telephony(const Server& daemon) {
+  Finding finding{"telephony", Verdict::well, {}, PropertyValue::dictionary()};
+  struct stat status {};
+  const bool marked = exists(kMark, &status);
+  const bool expected = marked || exists(kSocket, &status);
+  put(finding.facts, "expected", PropertyValue::boolean(expected));
+  if (!expected) {
+    finding.lines.push_back(std::string("none on this device: there is no ") + kMark);
+    return finding;
+  }
+  const Server service = server_of("telvane");
+  const std::optional<bool> followed = daemon.process > 0 ? follows_telephony(daemon.process) : std::nullopt;
+  if (followed) put(finding.facts, "followed", PropertyValue::boolean(*followed));
+  if (followed.value_or(false)) {
+    finding.lines.push_back(service.state == Server::State::serving ? "followed, served by " + name_of(service)
+                                                                    : "followed");
+    return finding;
+  }
+  finding.verdict = followed || service.state == Server::State::absent ? Verdict::ill : Verdict::unknown;
+  const std::string why = finding.verdict == Verdict::unknown && daemon.process > 0
+                              ? "only root and the daemon's user can see whether it is"
+                              : why_not_followed(service, marked);
+  finding.lines.push_back((finding.verdict == Verdict::unknown ? "followed or not: " : "not followed: ") + why);
+  put(finding.facts, "reason", PropertyValue::string(displayable(why)));
+  return finding;
+}
+
+Finding check_ark() {
+  Finding finding{"ark", Verdict::well, {}, PropertyValue::dictionary()};
+  put(finding.facts, "file", PropertyValue::string(kArkFile));
+  try {
+    struct stat status {};
+    const std::optional<PropertyValue> ark = read_saved_ark();
+    const std::int64_t count = ark ? static_cast<std::int64_t>(ark->size()) : 0;
+    put(finding.facts, "entries", PropertyValue::integer(count));
+    if (!ark || !exists(kArkFile, &status)) {
+      finding.lines.push_back("nothing is saved; the daemon saves once, at its start");
+      return finding;
+    }
+    const double saved = static_cast<double>(status.st_mtim.tv_sec) - kEpoch;
+    finding.lines.push_back(std::to_string(count) + (count == 1 ? " entry" : " entries") + ", saved " +
+                            since_text(saved));
+    put(finding.facts, "saved", PropertyValue::date(saved));
+  } catch (const Failure& failure) {
+    finding.verdict = Verdict::ill;
+    finding.lines.push_back(failure.message);
+  }
+  return finding;
+}
+
+Finding check_log() {
+  Finding finding{"log", Verdict::well, {kLogFile}, PropertyValue::dictionary()};
+  put(finding.facts, "file", PropertyValue::string(kLogFile));
+  try {
+    LogFiles files;
+    std::string tail;
+    if (files.open()) {
+      for (std::string bytes; !(bytes = files.read()).empty();) {
+        tail += bytes;
+        if (tail.size() > kLongestLine) tail.erase(0, tail.size() - kLongestLine);
+      }
+    }
+    while (tail.ends_with('\n')) tail.pop_back();
+    const std::string last = displayable(tail.substr(tail.rfind('\n') + 1));
+    if (last.empty()) {
+      finding.verdict = Verdict::ill;
+      finding.lines.emplace_back("is missing or empty");
+    } else {
+      finding.lines.push_back(last);
+      put(finding.facts, "last", PropertyValue::string(last));
+    }
+  } catch (const Failure& failure) {
+    finding.verdict = Verdict::ill;
+    finding.lines.push_back(failure.message);
+  }
+  return finding;
+}
+
+}  // namespace quorvel::tools
