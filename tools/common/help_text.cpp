@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "command_words.h"
+#include "human_text.h"
 
 namespace quorvel::tools {
 namespace {
@@ -11,28 +12,6 @@ constexpr std::size_t kWidth = 80;
 constexpr std::size_t kWidestName = 22;
 
 using Rows = std::vector<std::pair<std::string, std::string>>;
-
-// `text` at column `indent`, where the line stands already; every line end that it holds stays.
-void append_wrapped(const std::string& text, std::size_t indent, std::string& help) {
-  std::size_t column = indent;
-  for (std::size_t start = 0; start < text.size();) {
-    const std::size_t end = std::min(text.find_first_of(" \n", start), text.size());
-    const std::size_t length = end - start;
-    if (column > indent && column + 1 + length > kWidth) {
-      help.append("\n").append(indent, ' ');
-      column = indent;
-    }
-    if (column > indent) ++column, help += ' ';
-    help.append(text, start, length);
-    column += length;
-    if (end < text.size() && text[end] == '\n') {
-      help.append("\n").append(indent, ' ');
-      column = indent;
-    }
-    start = end + 1;
-  }
-  help += '\n';
-}
 
 void append_rows(const std::string& heading, const Rows& rows, std::string& help) {
   if (rows.empty()) return;
@@ -47,7 +26,7 @@ void append_rows(const std::string& heading, const Rows& rows, std::string& help
     } else {
       help.append(indent - name.size() - 2, ' ');
     }
-    append_wrapped(sentence, indent, help);
+    help += wrapped(sentence, indent, kWidth) + '\n';
   }
 }
 
@@ -92,10 +71,9 @@ std::string usage_of(const CLI::App& command) {
 std::string HelpFormatter::make_help(const CLI::App* app, std::string, CLI::AppFormatMode) const {
   const std::string start = "Usage: " + full_name(*app) + ' ';
   std::string help = summary_of(*app) + ".\n\n" + start;
-  append_wrapped(usage_of(*app), start.size(), help);
+  help += wrapped(usage_of(*app), start.size(), kWidth) + '\n';
   if (const std::string about = about_of(*app); !about.empty()) {
-    help += '\n';
-    append_wrapped(about, 0, help);
+    help += '\n' + wrapped(about, 0, kWidth) + '\n';
   }
   Rows commands;
   for (const CLI::App* command : commands_of(*app)) commands.emplace_back(command->get_name(), summary_of(*command));

@@ -57,7 +57,7 @@ int print_facts(std::vector<LiveAnswer> facts, bool all, bool json) {
     }
     print_value(array, true);
   } else {
-    write_output(facts_text(facts, terminal_width()));
+    write_output(facts_text(facts, terminal_width().value_or(80)));
   }
   return none ? kNoValue : kDone;
 }
@@ -96,7 +96,7 @@ int run_facts(const FactWords& words, bool json) {
   const auto interval = std::chrono::seconds(watched ? number_of_word(words.seconds, "--watch", 1, 86'400) : 0);
   if (watched) end_when_interrupted();
   const std::vector<LiveAnswer> facts = ask(rows);
-  note("asked as " + user_name(::geteuid()) + ", outside the daemon's sandbox; the daemon itself may see other facts");
+  note("asked as " + user_name(::geteuid()) + ", outside the daemon's sandbox");
   if (watched && json) {
     for (const LiveAnswer& fact : facts) {
       if (fact.value || words.all) print_change_of(fact, true);

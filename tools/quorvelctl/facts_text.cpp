@@ -1,8 +1,5 @@
 #include "facts_text.h"
 
-#include <sys/ioctl.h>
-#include <unistd.h>
-
 #include <algorithm>
 
 #include "common/failure.h"
@@ -11,15 +8,8 @@
 namespace quorvel::tools {
 namespace {
 
-constexpr std::size_t kUsualWidth = 80;
 constexpr std::size_t kIndent = 2;
 constexpr std::size_t kGap = 2;
-
-// Characters, so that columns stay straight where a text has letters of more than one byte.
-std::size_t columns_of(std::string_view text) {
-  return static_cast<std::size_t>(std::count_if(
-      text.begin(), text.end(), [](char byte) { return (static_cast<unsigned char>(byte) & 0xc0) != 0x80; }));
-}
 
 std::string source_of(const LiveAnswer& fact) {
   const std::string kind(kind_name(fact.value.kind()));
@@ -116,12 +106,6 @@ PropertyValue fact_value(const LiveAnswer& fact) {
   if (!fact.unit.empty()) put(result, "unit", PropertyValue::string(fact.unit));
   if (!fact.origin.empty()) put(result, "origin", PropertyValue::string(fact.origin));
   return result;
-}
-
-std::size_t terminal_width() {
-  winsize size{};
-  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) != 0 || size.ws_col < 40) return kUsualWidth;
-  return size.ws_col;
 }
 
 }  // namespace quorvel::tools

@@ -19,7 +19,4 @@ namespace quorvel::tools {
 /// "origin".
 [[nodiscard]] PropertyValue fact_value(const LiveAnswer& fact);
 
-/// How wide standard output's terminal is; 80 elsewhere.
-[[nodiscard]] std::size_t terminal_width();
-
 }  // namespace quorvel::tools

@@ -1,3 +1,5 @@
+#include <cstdint>
+
 #include "commands.h"
 #include "common/human_text.h"
 #include "output.h"
@@ -6,15 +8,18 @@
 namespace quorvel::tools {
 namespace {
 
+constexpr std::size_t kNameColumns = 11;
+
 void print_findings(const std::vector<Finding>& findings) {
   const Palette& colours = palette();
+  const std::size_t width = terminal_width().value_or(SIZE_MAX);
   std::string text;
   for (const Finding& finding : findings) {
     const std::string_view shade = finding.verdict == Verdict::well ? std::string_view() : colours.warning;
-    text.append(colours.key).append(finding.name).append(colours.reset).append(11 - finding.name.size(), ' ');
+    text.append(colours.key).append(finding.name).append(colours.reset).append(kNameColumns - finding.name.size(), ' ');
     for (std::size_t i = 0; i < finding.lines.size(); ++i) {
-      text.append(i == 0 ? 0 : 11, ' ').append(i == 0 ? shade : colours.quiet);
-      text.append(displayable(finding.lines[i])).append(colours.reset).append("\n");
+      text.append(i == 0 ? 0 : kNameColumns, ' ').append(i == 0 ? shade : colours.quiet);
+      text.append(wrapped(displayable(finding.lines[i]), kNameColumns, width)).append(colours.reset).append("\n");
     }
   }
   write_output(text);
