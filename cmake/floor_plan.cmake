@@ -6,7 +6,7 @@ if(NOT PLAN)
   set(PLAN ${TREE}/docs/architecture.md)
 endif()
 set(linux_headers "^(linux/|asm/|sys/(epoll|eventfd|signalfd|timerfd|inotify|fanotify|pidfd|prctl|sendfile|syscall)\\.h)")
-set(linux_folders "^(src/linux|client|tools)(/|$)")
+set(linux_folders "^(src/linux|client|telephony-service|bridge|tools)(/|$)")
 set(include_roots src . client/include tools)  # beside the including file's own folder
 
 # Sets `folders` to the table's first column, and `may_include_<folder>` for each.
@@ -80,6 +80,7 @@ endfunction()
 file(REAL_PATH ${TREE} real_tree)
 read_plan()
 file(GLOB_RECURSE files RELATIVE ${TREE} ${TREE}/src/*.h ${TREE}/src/*.cpp ${TREE}/client/*.h ${TREE}/client/*.cpp
+     ${TREE}/telephony-service/*.h ${TREE}/telephony-service/*.cpp ${TREE}/bridge/*.h ${TREE}/bridge/*.cpp
      ${TREE}/tools/*.h ${TREE}/tools/*.cpp)
 foreach(file IN LISTS files)
   check_file(${file})

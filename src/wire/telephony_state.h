@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <string_view>
 
+#include "platform/telephony.h"
 #include "property/value.h"
 
 namespace quorvel::wire {
@@ -32,9 +33,36 @@ inline constexpr StaticText kStateValueKey = "Value";
 inline constexpr StaticText kStateDomainKey = "Domain";
 inline constexpr StaticText kStateCodeKey = "Code";
 
-/// SIM statuses that a service reports for a card that works and for an empty tray.
+/// SIM statuses: a card that works; an empty tray; a card that waits for its PIN or its PUK; a card or modem with
+/// another lock; a card that does not work.
 inline constexpr StaticText kSimStatusReady = "Ready";
 inline constexpr StaticText kSimStatusNotInserted = "NotInserted";
+inline constexpr StaticText kSimStatusPinRequired = "PinRequired";
+inline constexpr StaticText kSimStatusPukRequired = "PukRequired";
+inline constexpr StaticText kSimStatusLocked = "Locked";
+inline constexpr StaticText kSimStatusFailed = "Failed";
+
+/// Every notification that a service sends.
+inline constexpr std::string_view kTelephonyNotifications[] = {
+    platform::kSimNewlyInserted.text(),
+    platform::kSimStatusChanged.text(),
+    platform::kPhoneNumberChanged.text(),
+    platform::kPostponementStatusChanged.text(),
+};
+
+/// The events that an observer is sent behind its first state, once the service has told anybody anything: each kind of
+/// baseband has its facts collected on one of them.
+inline constexpr std::string_view kCatchUpEvents[] = {
+    platform::kSimStatusChanged.text(),
+    platform::kPostponementStatusChanged.text(),
+};
+
+[[nodiscard]] constexpr bool is_telephony_notification(std::string_view name) noexcept {
+  for (const std::string_view known : kTelephonyNotifications) {
+    if (known == name) return true;
+  }
+  return false;
+}
 
 // Commands are calls on the service's socket, answered in turn: with the state (show), with the observers (notify),
 // with no value (the others), or with a failure. A connection that has made a call is sent replies only, no events.
@@ -44,9 +72,8 @@ inline constexpr StaticText kSimStatusNotInserted = "NotInserted";
 //   set      "Field", "Value" (absent: no value)     the field has the value; nobody is told
 //   fail     "Field", "Domain", "Code" (int32)       the field has the error pair, beside its value
 //   succeed  "Field"                                 the field has no error pair
-//   notify   "Name", "Count" (default 1)             sends the event so many times; answered when those who observe
-//   have
-//                                                    taken what was sent, up to a bounded rest
+//   notify   "Name", "Count" (default 1)             sends the event so many times; answered once every observer has
+//                                                    taken it, up to a bounded rest
 inline constexpr std::string_view kShowCommand = "show";
 inline constexpr std::string_view kSetCommand = "set";
 inline constexpr std::string_view kFailCommand = "fail";

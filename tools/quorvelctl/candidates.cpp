@@ -5,7 +5,6 @@
 #include <cstdlib>
 
 #include "commands.h"
-#include "common/telephony_names.h"
 #include "files.h"
 #include "platform/file_system.h"
 #include "saved_ark.h"
@@ -99,7 +98,7 @@ std::vector<Candidate> known_values(const UnfinishedCall& call) {
   if (call.value == "FIELD") return telephony_fields(call.command->get_name());
   std::vector<Candidate> names;
   if (call.value == "NAME") {
-    for (const std::string_view name : kTelephonyNotifications) names.push_back({std::string(name)});
+    for (const std::string_view name : wire::kTelephonyNotifications) names.push_back({std::string(name)});
   }
   return names;
 }

@@ -4,7 +4,6 @@
 #include "commands.h"
 #include "common/human_text.h"
 #include "common/json.h"
-#include "common/telephony_names.h"
 #include "common/words.h"
 #include "output.h"
 #include "sim_calls.h"
@@ -42,9 +41,9 @@ const std::string& field(const SimWords& words) {
 }
 
 std::uint64_t notify(const std::string& name, std::int64_t count) {
-  if (is_telephony_notification(name)) return notify_observers(name, static_cast<std::uint32_t>(count));
+  if (wire::is_telephony_notification(name)) return notify_observers(name, static_cast<std::uint32_t>(count));
   throw Failure{kWrongWords,
-                "\"" + name + "\" is no notification. Use one of: " + list_of(kTelephonyNotifications, " or ")};
+                "\"" + name + "\" is no notification. Use one of: " + list_of(wire::kTelephonyNotifications, " or ")};
 }
 
 std::int32_t error_number(const std::string& word, const std::string& name) {
@@ -181,7 +180,7 @@ void add_event_commands(CLI::App& sim, CommandLine& line, const Words& words) {
                         "  quorvelctl sim notify sim-status-changed\n"
                         "  quorvelctl sim notify --count 1000 phone-number-changed"},
                        send_notification);
-  add_word(*send, "NAME", words->name, "One of " + list_of(kTelephonyNotifications, " and "))->required();
+  add_word(*send, "NAME", words->name, "One of " + list_of(wire::kTelephonyNotifications, " and "))->required();
   add_word(*send, "--count", words->count, "Send it N times")->option_text("N");
   CLI::App* insert = add(sim, line, words,
                          {"insert", "Insert a SIM: set its fields, then send the notifications",

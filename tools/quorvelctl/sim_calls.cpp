@@ -1,7 +1,6 @@
 #include "sim_calls.h"
 
 #include "client_failure.h"
-#include "common/telephony_names.h"
 #include "output.h"
 #include "wire/telephony_state.h"
 

@@ -5,6 +5,7 @@
 #include <csignal>
 #include <cstdio>
 #include <cstring>
+#include <system_error>
 
 #include "common/command_words.h"
 #include "common/completion.h"
@@ -13,10 +14,10 @@
 #include "common/human_text.h"
 #include "common/root_option.h"
 #include "common/words.h"
-#include "platform/file_system.h"
 #include "platform/process.h"
-#include "server.h"
-#include "wire/service_path.h"
+#include "sim_state.h"
+#include "telephony-service/listener.h"
+#include "telephony-service/server.h"
 
 namespace quorvel::tools {
 namespace {
@@ -51,26 +52,36 @@ Descriptor open_signals() {
 }
 
 platform::host::ListeningSocket open_listener() {
-  for (const char* directory : {"/run", wire::kServiceDirectory.data()}) {
-    if (platform::make_directory(directory, 0755) != 0 && errno != EEXIST) {
-      throw Failure{kSystemError, std::string("cannot make ") + directory + ": " + std::strerror(errno)};
+  try {
+    return telephony::open_listener();
+  } catch (const std::system_error& error) {
+    if (error.code().value() == EADDRINUSE) {
+      throw Failure{kServiceUnavailable, "a telephony service is running already on " + telephony::socket_path()};
     }
+    throw Failure{kSystemError, std::string("cannot serve ") + error.what()};
   }
-  platform::host::ListeningSocket listener = platform::host::ListeningSocket::open(wire::kTelephonySocket);
-  if (listener) return listener;
-  const std::string path = std::string(wire::kServiceDirectory) + '/' + std::string(wire::kTelephonySocket);
-  if (errno == EADDRINUSE) throw Failure{kServiceUnavailable, "a telephony service is running already on " + path};
-  throw Failure{kSystemError, "cannot serve " + path + ": " + std::strerror(errno)};
+}
+
+void serve_until(telephony::Server& server, int signals) {
+  for (;;) {
+    std::vector<pollfd> waits = {{signals, POLLIN, 0}};
+    server.add_waits(waits);
+    if (::poll(waits.data(), waits.size(), server.wait_milliseconds()) < 0) continue;
+    if (waits[0].revents != 0) return;
+    server.serve(std::span(waits).subspan(1));
+  }
 }
 
 void serve() {
   const Descriptor signals = open_signals();
   if (!signals) throw Failure{kSystemError, std::string("cannot watch signals: ") + std::strerror(errno)};
-  Server server(open_listener());
+  telephony::Server server(open_listener(), [&server](std::string_view command, const PropertyValue& argument) {
+    return carry_out_command(server.state(), command, argument);
+  });
   std::puts("telvane-sim: ready, without a SIM");
   std::fflush(stdout);
   platform::report_ready();
-  server.run(signals.get());
+  serve_until(server, signals.get());
 }
 
 int run(int count, char** words) {

@@ -5,7 +5,6 @@
 #include <iterator>
 #include <limits>
 
-#include "wire/frame.h"
 #include "wire/telephony_state.h"
 
 namespace quorvel::tools {
@@ -45,40 +44,21 @@ std::string change_entry(std::string_view command, std::string_view field, const
 
 }  // namespace
 
-SimState::SimState() : state_(PropertyValue::dictionary()) {}
-
-std::string SimState::change(std::string_view command, const PropertyValue& argument) {
+std::string carry_out_command(telephony::StateFrames& state, std::string_view command, const PropertyValue& argument) {
+  if (command == wire::kNotifyCommand) return {};
+  if (command != wire::kSetCommand && command != wire::kFailCommand && command != wire::kSucceedCommand) {
+    return "there is no such command";
+  }
   const std::string_view field = argument.get(wire::kCommandFieldKey.text()).text();
   if (std::find(std::begin(wire::kStateFields), std::end(wire::kStateFields), field) == std::end(wire::kStateFields)) {
     return "there is no such field";
   }
-  PropertyValue changed = state_;
+  PropertyValue changed = state.value();
   PropertyValue entry = changed.get(field) ? changed.get(field) : PropertyValue::dictionary();
   std::string refusal = change_entry(command, field, argument, entry);
   if (!refusal.empty()) return refusal;
   if (!put(changed, field, entry.size() > 0 ? entry : PropertyValue())) return "memory does not suffice";
-  SharedFrame frame = frame_of(changed, {});
-  if (!frame) return "the state would become too large or too deep to be sent";
-  state_ = std::move(changed);
-  frames_.clear();
-  frames_.emplace(std::string(), std::move(frame));
-  return {};
-}
-
-SharedFrame SimState::state_frame() { return event_frame({}); }
-
-SharedFrame SimState::event_frame(const std::string& notification) {
-  SharedFrame& frame = frames_[notification];
-  if (!frame) frame = frame_of(state_, notification);
-  return frame;
-}
-
-SharedFrame SimState::frame_of(const PropertyValue& state, const std::string& notification) const {
-  const wire::FrameKind kind = notification.empty() ? wire::FrameKind::state : wire::FrameKind::event;
-  auto frame = std::make_shared<ByteBuffer>();
-  if (!wire::append_frame(kind, 0, 0, notification, state, *frame)) return nullptr;
-  constexpr std::size_t kLimit = wire::kMaximumStateBody - wire::kMaximumNameLength;
-  return frame->size() <= kLimit ? frame : nullptr;
+  return state.replace(changed) ? "" : "the state would become too large or too deep to be sent";
 }
 
 }  // namespace quorvel::tools

@@ -4,6 +4,7 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstddef>
@@ -103,7 +104,7 @@ ListeningSocket& ListeningSocket::operator=(ListeningSocket&& other) noexcept {
   return *this;
 }
 
-bool ListeningSocket::bind_and_listen(std::string_view name) noexcept {
+bool ListeningSocket::bind_and_listen(std::string_view name, mode_t mode) noexcept {
   char unfinished[kNameSize];
   const int length = std::snprintf(unfinished, sizeof unfinished, "%.*s%s", static_cast<int>(name.size()), name.data(),
                                    kUnfinishedSuffix.data());
@@ -113,9 +114,13 @@ bool ListeningSocket::bind_and_listen(std::string_view name) noexcept {
   ::unlinkat(directory_.get(), unfinished, 0);
   if (::bind(socket_.get(), address.get(), address.length) != 0) return false;
   struct stat status;
+  // A service that runs as root serves the directory's owner.
+  if (::geteuid() == 0 && ::fstat(directory_.get(), &status) == 0) {
+    static_cast<void>(::fchownat(directory_.get(), unfinished, status.st_uid, status.st_gid, AT_SYMLINK_NOFOLLOW));
+  }
   // Nobody can connect before the mode is set, because nobody listens yet; renaming then puts the file in its place
   // ready for use, and in place of a stale one at the same moment.
-  if (::fchmodat(directory_.get(), unfinished, 0666, 0) != 0 ||
+  if (::fchmodat(directory_.get(), unfinished, mode, 0) != 0 ||
       ::fstatat(directory_.get(), unfinished, &status, AT_SYMLINK_NOFOLLOW) != 0 ||
       ::listen(socket_.get(), kBacklog) != 0 ||
       ::renameat(directory_.get(), unfinished, directory_.get(), name_) != 0) {
@@ -129,7 +134,7 @@ bool ListeningSocket::bind_and_listen(std::string_view name) noexcept {
   return true;
 }
 
-ListeningSocket ListeningSocket::open(std::string_view name) noexcept {
+ListeningSocket ListeningSocket::open(std::string_view name, mode_t mode) noexcept {
   ListeningSocket result;
   if (name.empty() || name.size() >= kNameSize || name.find('/') != std::string_view::npos) {
     errno = ENAMETOOLONG;
@@ -139,7 +144,7 @@ ListeningSocket ListeningSocket::open(std::string_view name) noexcept {
   result.directory_ = open_service_directory();
   if (result.directory_ && may_replace(result.directory_.get(), result.name_)) {
     result.socket_ = make_socket();
-    if (result.socket_ && result.bind_and_listen(name)) return result;
+    if (result.socket_ && result.bind_and_listen(name, mode)) return result;
   }
   result.name_[0] = '\0';
   result.socket_ = Descriptor();

@@ -33,10 +33,10 @@ class ListeningSocket {
   ListeningSocket& operator=(ListeningSocket&& other) noexcept;
   ~ListeningSocket() { remove_file(); }
 
-  /// Listens on `name` in the service directory. The file has mode 0666 before anybody can connect; one that was left
-  /// behind by a dead process is replaced. Empty with errno set: EADDRINUSE when a live process holds it, EEXIST when
-  /// what stands there is no socket.
-  [[nodiscard]] static ListeningSocket open(std::string_view name) noexcept;
+  /// Listens on `name` in the service directory. The file has `mode` and the directory's owner, as far as this process
+  /// may give it away, before anybody can connect; one that was left behind by a dead process is replaced. Empty with
+  /// errno set: EADDRINUSE when a live process holds it, EEXIST when what stands there is no socket.
+  [[nodiscard]] static ListeningSocket open(std::string_view name, mode_t mode = 0666) noexcept;
 
   [[nodiscard]] explicit operator bool() const noexcept { return static_cast<bool>(socket_); }
   [[nodiscard]] int get() const noexcept { return socket_.get(); }
@@ -46,7 +46,7 @@ class ListeningSocket {
  private:
   static constexpr std::size_t kNameSize = 108;
 
-  [[nodiscard]] bool bind_and_listen(std::string_view name) noexcept;
+  [[nodiscard]] bool bind_and_listen(std::string_view name, mode_t mode) noexcept;
 
   Descriptor socket_;
   Descriptor directory_;

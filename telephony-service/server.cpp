@@ -1,4 +1,4 @@
-#include "server.h"
+#include "telephony-service/server.h"
 
 #include <sys/socket.h>
 #include <unistd.h>
@@ -6,25 +6,17 @@
 #include <algorithm>
 #include <cerrno>
 
-#include "common/telephony_names.h"
 #include "property/binary/binary.h"
+#include "telephony-service/listener.h"
 #include "wire/failure.h"
 #include "wire/telephony_state.h"
 
-namespace quorvel::tools {
+namespace quorvel::telephony {
 namespace {
 
 constexpr std::size_t kMaximumPeers = 256;
 constexpr int kRetryMilliseconds = 100;
 constexpr int kEventsPerTurn = 1000;
-
-// Whoever may connect may observe; the state is changed by the simulator's own user and by root.
-bool is_trusted(int connection) noexcept {
-  ucred peer{};
-  socklen_t size = sizeof peer;
-  if (::getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return false;
-  return peer.uid == 0 || peer.uid == ::geteuid();
-}
 
 SharedFrame reply_frame(std::uint64_t serial, const PropertyValue& value) {
   auto frame = std::make_shared<ByteBuffer>();
@@ -42,28 +34,7 @@ SharedFrame failure_frame(std::uint64_t serial, const std::string& description) 
 
 }  // namespace
 
-void Server::run(int signals) {
-  for (;;) {
-    std::vector<pollfd> waits = interests(signals);
-    if (::poll(waits.data(), waits.size(), wait_milliseconds()) < 0) continue;
-    if (waits[0].revents != 0) return;
-    std::size_t next = 2;
-    for (auto peer = peers_.begin(); peer != peers_.end(); ++next) {
-      const bool stays = waits[next].revents == 0 || serve(*peer, waits[next].revents);
-      peer = stays ? std::next(peer) : peers_.erase(peer);
-    }
-    carry_on_jobs();
-    drop_the_slow();
-    // Last, so that those who came stand in no list of waits yet.
-    out_of_descriptors_ = false;
-    if (waits[1].revents != 0) accept_all();
-  }
-}
-
-std::vector<pollfd> Server::interests(int signals) const {
-  std::vector<pollfd> waits;
-  waits.reserve(peers_.size() + 2);
-  waits.push_back({signals, POLLIN, 0});
+void Server::add_waits(std::vector<pollfd>& waits) const {
   const bool accepts = peers_.size() < kMaximumPeers && !out_of_descriptors_;
   waits.push_back({accepts ? listener_.get() : -1, POLLIN, 0});
   for (const Peer& peer : peers_) {
@@ -71,7 +42,19 @@ std::vector<pollfd> Server::interests(int signals) const {
     waits.push_back(
         {peer.descriptor(), static_cast<short>((reads ? POLLIN : 0) | (peer.has_waiting() ? POLLOUT : 0)), 0});
   }
-  return waits;
+}
+
+void Server::serve(std::span<const pollfd> waits) {
+  std::size_t next = 1;
+  for (auto peer = peers_.begin(); peer != peers_.end(); ++next) {
+    const bool stays = waits[next].revents == 0 || serve_peer(*peer, waits[next].revents);
+    peer = stays ? std::next(peer) : peers_.erase(peer);
+  }
+  carry_on_jobs();
+  drop_the_slow();
+  // Last, so that a new peer is not looked for among these waits.
+  out_of_descriptors_ = false;
+  if (waits[0].revents != 0) accept_all();
 }
 
 int Server::wait_milliseconds() const {
@@ -96,13 +79,23 @@ void Server::accept_all() {
       out_of_descriptors_ = errno != EAGAIN;
       return;
     }
-    const bool trusted = is_trusted(connection.get());
-    Peer& peer = peers_.emplace_back(std::move(connection), trusted);
-    if (!peer.send(state_.state_frame())) peers_.pop_back();
+    if (is_trusted(connection.get())) introduce(std::move(connection));
   }
 }
 
-bool Server::serve(Peer& peer, short events) {
+// An observer collects the facts on an event only: one that comes late is told again of the events that matter.
+void Server::introduce(Descriptor connection) {
+  Peer& peer = peers_.emplace_back(std::move(connection));
+  bool sent = peer.send(frames_.state_frame());
+  if (has_told_) {
+    for (const std::string_view name : wire::kCatchUpEvents) {
+      sent = sent && peer.send(frames_.event_frame(std::string(name)));
+    }
+  }
+  if (!sent) peers_.pop_back();
+}
+
+bool Server::serve_peer(Peer& peer, short events) {
   if ((events & POLLOUT) != 0 && (!peer.flush() || !carry_out_calls(peer))) return false;
   if ((events & POLLIN) != 0) {
     if (!peer.receive() || !carry_out_calls(peer)) return false;
@@ -125,22 +118,19 @@ bool Server::carry_out_calls(Peer& peer) {
 
 bool Server::carry_out(Peer& peer, const wire::Frame& call) {
   peer.commands = true;
-  if (!peer.may_command()) return answer(peer, call, {}, "only the simulator's own user may command it");
   const PropertyValue argument =
       call.payload.empty() ? PropertyValue() : read_binary(call.payload, Mutability::immutable);
   if (!argument && !call.payload.empty()) return answer(peer, call, {}, "the argument cannot be read");
-  if (call.name == wire::kShowCommand) return answer(peer, call, state_.value(), {});
-  if (call.name == wire::kNotifyCommand) return start_notify(peer, call, argument);
-  if (call.name == wire::kSetCommand || call.name == wire::kFailCommand || call.name == wire::kSucceedCommand) {
-    return answer(peer, call, {}, state_.change(call.name, argument));
-  }
-  return answer(peer, call, {}, "there is no such command");
+  if (call.name == wire::kShowCommand) return answer(peer, call, frames_.value(), {});
+  const std::string refusal = command_(call.name, argument);
+  if (refusal.empty() && call.name == wire::kNotifyCommand) return start_notify(peer, call, argument);
+  return answer(peer, call, {}, refusal);
 }
 
 bool Server::start_notify(Peer& peer, const wire::Frame& call, const PropertyValue& argument) {
   const std::string name(argument.get(wire::kCommandNameKey.text()).text());
   const PropertyValue& count = argument.get(wire::kCommandCountKey.text());
-  if (!is_telephony_notification(name)) return answer(peer, call, {}, "there is no such notification");
+  if (!wire::is_telephony_notification(name)) return answer(peer, call, {}, "there is no such notification");
   if (count && !count.to_uint64()) return answer(peer, call, {}, "the count is no positive integer");
   const bool wants_reply = (call.head.flags & wire::kFlagNoReply) == 0;
   peer.job = NotifyJob{name, count ? *count.to_uint64() : 1, call.head.serial, wants_reply, 0};
@@ -182,7 +172,8 @@ PropertyValue Server::notify_result(const NotifyJob& job) const {
 }
 
 void Server::send_event(const std::string& name) {
-  const SharedFrame frame = state_.event_frame(name);
+  has_told_ = true;
+  const SharedFrame frame = frames_.event_frame(name);
   // A broken connection is found and dropped by the next wait.
   for (Peer& peer : peers_) {
     if (!peer.commands) static_cast<void>(peer.send(frame));
@@ -205,4 +196,4 @@ bool Server::observers_keep_up() const {
                       [](const Peer& peer) { return !peer.commands && peer.is_behind(); });
 }
 
-}  // namespace quorvel::tools
+}  // namespace quorvel::telephony

@@ -1,4 +1,4 @@
-// One connection of the simulator: an observer, or somebody who commands.
+// One connection to a telephony service: an observer, or a person's command.
 #pragma once
 
 #include <chrono>
@@ -8,12 +8,12 @@
 #include <string>
 
 #include "platform/descriptor.h"
-#include "sim_state.h"
+#include "telephony-service/state_frames.h"
 #include "wire/frame.h"
 
-namespace quorvel::tools {
+namespace quorvel::telephony {
 
-/// A notification that somebody asked for and that is not yet sent in full.
+/// A notification that a command asked for and that is not yet sent in full.
 struct NotifyJob {
   std::string name;
   std::uint64_t left;
@@ -26,27 +26,24 @@ class Peer {
  public:
   using Clock = std::chrono::steady_clock;
 
-  /// `may_command`: whether the process on the other end is trusted to change the state.
-  Peer(Descriptor connection, bool may_command) noexcept
-      : connection_(std::move(connection)), may_command_(may_command) {}
+  explicit Peer(Descriptor connection) noexcept : connection_(std::move(connection)) {}
 
   [[nodiscard]] int descriptor() const noexcept { return connection_.get(); }
-  [[nodiscard]] bool may_command() const noexcept { return may_command_; }
 
   /// Reads what has arrived. False when the connection is of no more use.
   [[nodiscard]] bool receive();
-  /// The next call that has arrived in full, valid until the next `receive`. `refused` when what came is no call.
+  /// The next call that has arrived in full, valid until the next `receive`. `refused` when the bytes are no call.
   [[nodiscard]] wire::FrameResult next_call(wire::Frame& frame) noexcept;
 
-  /// Adds a frame to what is to be sent, and sends as much as goes at once. False when the connection is broken.
+  /// Adds a frame to those to be sent, and sends as much as goes at once. False when the connection is broken.
   [[nodiscard]] bool send(SharedFrame frame);
   [[nodiscard]] bool flush();
 
   /// True when so much waits to be sent that nothing should be added.
   [[nodiscard]] bool is_behind() const noexcept { return waiting_bytes_ > kWaitingBound; }
   [[nodiscard]] bool has_waiting() const noexcept { return !waiting_.empty(); }
-  /// When a peer that does not read has had its time; for a peer that something waits for.
-  [[nodiscard]] Clock::time_point deadline() const noexcept { return progress_ + kPatience; }
+  /// When the frame that is being sent has had its time, which no byte renews; for a peer that something waits for.
+  [[nodiscard]] Clock::time_point deadline() const noexcept { return frame_started_ + kPatience; }
   /// True when the other end sends nothing more.
   [[nodiscard]] bool ended() const noexcept { return ended_; }
 
@@ -59,14 +56,13 @@ class Peer {
   static constexpr auto kPatience = std::chrono::seconds(5);
 
   Descriptor connection_;
-  bool may_command_;
   bool ended_ = false;
   ByteBuffer received_;
   std::size_t taken_ = 0;
   std::deque<SharedFrame> waiting_;
   std::size_t sent_of_first_ = 0;
   std::size_t waiting_bytes_ = 0;
-  Clock::time_point progress_ = Clock::now();
+  Clock::time_point frame_started_ = Clock::now();
 };
 
-}  // namespace quorvel::tools
+}  // namespace quorvel::telephony

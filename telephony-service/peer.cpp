@@ -1,4 +1,4 @@
-#include "peer.h"
+#include "telephony-service/peer.h"
 
 #include <sys/socket.h>
 
@@ -6,11 +6,10 @@
 
 #include "wire/telephony_state.h"
 
-namespace quorvel::tools {
+namespace quorvel::telephony {
 namespace {
 
 constexpr std::size_t kReadSize = 64u << 10;
-constexpr std::uint32_t kUntrustedBody = 4096;
 
 }  // namespace
 
@@ -26,8 +25,7 @@ bool Peer::receive() {
 }
 
 wire::FrameResult Peer::next_call(wire::Frame& frame) noexcept {
-  const std::uint32_t maximum = may_command_ ? wire::kMaximumStateBody : kUntrustedBody;
-  const wire::FrameResult result = wire::parse_frame(received_.bytes().subspan(taken_), maximum, frame);
+  const wire::FrameResult result = wire::parse_frame(received_.bytes().subspan(taken_), wire::kMaximumStateBody, frame);
   if (result != wire::FrameResult::complete) return result;
   if (frame.head.kind != wire::FrameKind::call) return wire::FrameResult::refused;
   taken_ += wire::kFrameHeadSize + frame.head.body_length;
@@ -36,7 +34,7 @@ wire::FrameResult Peer::next_call(wire::Frame& frame) noexcept {
 
 bool Peer::send(SharedFrame frame) {
   if (!frame) return false;
-  if (waiting_.empty()) progress_ = Clock::now();
+  if (waiting_.empty()) frame_started_ = Clock::now();
   waiting_bytes_ += frame->size();
   waiting_.push_back(std::move(frame));
   return flush();
@@ -49,14 +47,14 @@ bool Peer::flush() {
                                  MSG_NOSIGNAL | MSG_DONTWAIT);
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return errno == EAGAIN;
-    progress_ = Clock::now();
     sent_of_first_ += static_cast<std::size_t>(count);
     waiting_bytes_ -= static_cast<std::size_t>(count);
     if (sent_of_first_ < frame.size()) continue;
     waiting_.pop_front();
     sent_of_first_ = 0;
+    frame_started_ = Clock::now();
   }
   return true;
 }
 
-}  // namespace quorvel::tools
+}  // namespace quorvel::telephony
