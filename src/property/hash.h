@@ -8,6 +8,8 @@
 
 namespace quorvel {
 
+static_assert(sizeof(void*) == 8, "quorveld is for 64-bit processors");
+
 namespace detail {
 
 __extension__ using Product = unsigned __int128;

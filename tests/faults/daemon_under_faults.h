@@ -47,6 +47,7 @@ class DaemonUnderFaults {
   ScratchRoot root;
 
  private:
+  [[nodiscard]] std::string log_of(const std::string& path) const;
   [[nodiscard]] std::string data() const;
 
   std::string plan_path_;

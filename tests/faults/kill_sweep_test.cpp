@@ -12,7 +12,7 @@ class KillSweep : public testing::Test {
  protected:
   // The calls of an undisturbed start, and how long it takes.
   std::uint32_t calls_of_a_start() {
-    daemon.prepare();
+    daemon.prepare().flush_milliseconds = flush_milliseconds;
     daemon.arm();
     const auto begin = std::chrono::steady_clock::now();
     daemon.start();
@@ -60,6 +60,7 @@ class KillSweep : public testing::Test {
 
   DaemonUnderFaults daemon;
   std::chrono::steady_clock::duration start_takes{};
+  std::uint32_t flush_milliseconds = 0;
   int kills = 0;
   int inside_save = 0;
   int failures = 0;
@@ -85,13 +86,14 @@ TEST_F(KillSweep, AtEveryCall) {
 
 TEST_F(KillSweep, AtRandomInstants) {
   const int rounds = is_long_run() ? 10'000 : 200;
+  flush_milliseconds = 2;
   calls_of_a_start();
   calls_of_a_start();
   std::mt19937_64 random(20'260'131);
   for (int round = 0; round < rounds; ++round) {
     const auto instant =
         std::chrono::nanoseconds(static_cast<std::int64_t>(random() % static_cast<std::uint64_t>(start_takes.count())));
-    daemon.prepare();
+    daemon.prepare().flush_milliseconds = flush_milliseconds;
     daemon.arm();
     const auto begin = std::chrono::steady_clock::now();
     daemon.start();

@@ -157,7 +157,7 @@ TEST_F(HostileClientsTest, ObserversThatNeverReadSlowNobodyDown) {
   ASSERT_FALSE(good.connect());
   std::vector<client::Observer> bad(64);
   for (client::Observer& observer : bad) ASSERT_FALSE(observer.connect());
-  const long before = resident_kib(pid());
+  const long before = own_kib(pid());
   constexpr std::uint64_t kAtOnce = 500;
   const auto count = static_cast<std::uint64_t>(quick_or_long(10'000, 100'000)) / kAtOnce * kAtOnce;
   client::Event event;
@@ -172,7 +172,7 @@ TEST_F(HostileClientsTest, ObserversThatNeverReadSlowNobodyDown) {
   }
   tell_figure("notifications to a good observer beside 64 that never read", "each one",
               std::to_string(received) + " of " + std::to_string(count), received == count);
-  const double grown = static_cast<double>(resident_kib(pid()) - before) / 1024;
+  const double grown = static_cast<double>(own_kib(pid()) - before) / 1024;
   tell_figure("memory for observers that never read", "1 MiB", written(grown, "MiB"), grown <= 1);
   expect_quick_end("with observers that never read");
 }

@@ -29,6 +29,7 @@ long status_entry(pid_t pid, const std::string& name) {
 }  // namespace
 
 long resident_kib(pid_t pid) { return status_entry(pid, "VmRSS:"); }
+long own_kib(pid_t pid) { return status_entry(pid, "RssAnon:"); }
 long peak_resident_kib(pid_t pid) { return status_entry(pid, "VmHWM:"); }
 
 void forget_peak(pid_t pid) { std::ofstream(in_proc(pid, "clear_refs")) << "5\n"; }

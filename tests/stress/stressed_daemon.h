@@ -9,8 +9,10 @@
 
 namespace quorvel::test {
 
-/// Of process `pid`: memory now, and the most since the last `forget_peak`, in KiB; processor time used.
+/// Of process `pid`: memory now, that of it which is not the pages of files, and the most since the last `forget_peak`,
+/// in KiB; processor time used.
 [[nodiscard]] long resident_kib(pid_t pid);
+[[nodiscard]] long own_kib(pid_t pid);
 [[nodiscard]] long peak_resident_kib(pid_t pid);
 void forget_peak(pid_t pid);
 [[nodiscard]] std::chrono::nanoseconds processor_time(pid_t pid);

@@ -28,6 +28,17 @@ void read_prefix(DeviceRoot& root) noexcept {
   root.prefix_length = length == 1 ? 0 : static_cast<std::size_t>(length);
 }
 
+[[nodiscard]] int try_open(const DeviceRoot& root, const char* path, int flags, mode_t mode) noexcept {
+  if (root.is_plain()) return ::open(path, flags, mode);
+  // openat2 refuses a mode where nothing can be created, which open ignores.
+  const bool creates = (flags & O_CREAT) != 0 || (flags & O_TMPFILE) == O_TMPFILE;
+  struct open_how how = {};
+  how.flags = static_cast<std::uint64_t>(flags);
+  how.mode = creates ? mode & 07777 : 0;
+  how.resolve = RESOLVE_IN_ROOT;
+  return static_cast<int>(::syscall(SYS_openat2, root.descriptor, path, &how, sizeof how));
+}
+
 [[nodiscard]] DeviceRoot settle_device_root() noexcept {
   DeviceRoot root;
   const char* value = std::getenv("QUORVEL_ROOT");
@@ -40,21 +51,14 @@ void read_prefix(DeviceRoot& root) noexcept {
   root.descriptor = ::open(value, O_PATH | O_DIRECTORY | O_CLOEXEC);
   if (root.descriptor < 0) {
     root.error = errno;
-  } else {
-    read_prefix(root);
+    return root;
   }
+  read_prefix(root);
+  // Said once and in time, not at each path.
+  const int found = try_open(root, "/", O_PATH | O_CLOEXEC, 0);
+  if (found < 0 && errno == ENOSYS) root.error = ENOSYS;
+  if (found >= 0) ::close(found);
   return root;
-}
-
-[[nodiscard]] int try_open(const DeviceRoot& root, const char* path, int flags, mode_t mode) noexcept {
-  if (root.is_plain()) return ::open(path, flags, mode);
-  // openat2 refuses a mode where nothing can be created, which open ignores.
-  const bool creates = (flags & O_CREAT) != 0 || (flags & O_TMPFILE) == O_TMPFILE;
-  struct open_how how = {};
-  how.flags = static_cast<std::uint64_t>(flags);
-  how.mode = creates ? mode & 07777 : 0;
-  how.resolve = RESOLVE_IN_ROOT;
-  return static_cast<int>(::syscall(SYS_openat2, root.descriptor, path, &how, sizeof how));
 }
 
 }  // namespace

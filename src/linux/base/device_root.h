@@ -14,7 +14,8 @@ namespace quorvel::platform::host {
 struct DeviceRoot {
   /// The root directory, open for the life of the process; AT_FDCWD when the root is "/" itself, -1 when unusable.
   int descriptor = AT_FDCWD;
-  /// Why QUORVEL_ROOT cannot be used: an error number, 0 when it can.
+  /// Why QUORVEL_ROOT cannot be used: an error number, ENOSYS where the kernel cannot confine paths to a directory (it
+  /// has to be Linux 5.6 or later); 0 when it can.
   int error = 0;
   /// The root's own path as the kernel reports it, without a trailing slash: empty for "/".
   std::size_t prefix_length = 0;

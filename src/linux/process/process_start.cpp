@@ -81,6 +81,10 @@ int start_process(std::string_view service_name) noexcept {
     return EX_OSERR;
   }
   const host::DeviceRoot& root = host::device_root();
+  if (root.error == ENOSYS) {
+    host::print_error_line("QUORVEL_ROOT needs Linux 5.6 or later; unset, quorveld runs on this one as well");
+    return EX_CONFIG;
+  }
   if (root.error != 0) {
     errno = root.error;
     host::print_system_error("QUORVEL_ROOT must be the absolute path of a directory");

@@ -83,6 +83,7 @@ struct Plan {
   std::uint32_t target;  // a kill: number of the call, the first being 1; a fault: number among the calls of its kind
   Call kind;
   int error;
+  std::uint32_t flush_milliseconds;  // how long a flush takes at least
   std::atomic<bool> armed;
 
   // Written by the library.
