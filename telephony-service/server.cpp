@@ -164,9 +164,8 @@ void Server::carry_on_jobs() {
 }
 
 PropertyValue Server::notify_result(const NotifyJob& job) const {
-  const auto observers = std::count_if(peers_.begin(), peers_.end(), [](const Peer& peer) { return !peer.commands; });
   PropertyValue result = PropertyValue::dictionary(2);
-  const bool built = result.set(wire::kReplyObserversKey.text(), PropertyValue::integer(observers)) &&
+  const bool built = result.set(wire::kReplyObserversKey.text(), PropertyValue::unsigned_integer(observer_count())) &&
                      result.set(wire::kReplyCutOffKey.text(), PropertyValue::unsigned_integer(job.cut_off));
   return built ? result : PropertyValue();
 }
@@ -189,6 +188,11 @@ void Server::drop_the_slow() {
     if (peer.job) peer.job->cut_off += static_cast<std::uint64_t>(lost);
   }
   peers_.remove_if(is_slow);
+}
+
+std::size_t Server::observer_count() const {
+  return static_cast<std::size_t>(
+      std::count_if(peers_.begin(), peers_.end(), [](const Peer& peer) { return !peer.commands; }));
 }
 
 bool Server::observers_keep_up() const {

@@ -38,6 +38,10 @@ class Server {
   [[nodiscard]] int wait_milliseconds() const;
   void serve(std::span<const pollfd> waits);
 
+  /// How many observe, and whether each of them has taken what it was sent, but for a bounded rest.
+  [[nodiscard]] std::size_t observer_count() const;
+  [[nodiscard]] bool observers_keep_up() const;
+
  private:
   void accept_all();
   void introduce(Descriptor connection);
@@ -50,7 +54,6 @@ class Server {
   void carry_on_jobs();
   [[nodiscard]] PropertyValue notify_result(const NotifyJob& job) const;
   void drop_the_slow();
-  [[nodiscard]] bool observers_keep_up() const;
 
   platform::host::ListeningSocket listener_;
   Command command_;

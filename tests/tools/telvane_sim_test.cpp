@@ -1,6 +1,8 @@
 // The simulator's socket: what observers are pushed, what commands are answered, and who is cut off.
 #include <sys/socket.h>
 
+#include <fstream>
+
 #include "platform/telephony.h"
 #include "quorvel/client.h"
 #include "support/program.h"
@@ -22,6 +24,14 @@ struct Observer : SocketPeer {
     return (frame->kind == wire::FrameKind::state ? "state" : "event ") + frame->name + " " + described(frame->value);
   }
 };
+
+// The lines of a recording, each up to its time.
+std::vector<std::string> without_times(const std::string& path) {
+  std::vector<std::string> lines;
+  std::ifstream file(path);
+  for (std::string line; std::getline(file, line);) lines.push_back(line.substr(0, line.find(",\"time\"")));
+  return lines;
+}
 
 class TelvaneSim : public testing::Test {
  protected:
@@ -105,6 +115,36 @@ TEST_F(TelvaneSim, DeliversABurstInOrderAndCutsOffWhoDoesNotRead) {
   while (!asleep.next().empty()) continue;
   char byte;
   EXPECT_EQ(::recv(asleep.descriptor(), &byte, 1, MSG_DONTWAIT), 0) << "it was not cut off";
+}
+
+TEST_F(TelvaneSim, PlaysWhatWasRecorded) {
+  simulator_->stop();
+  const std::string recording = root.outside() / "recording";
+  const auto run = [&](std::vector<std::string> arguments) {
+    simulator_.emplace(simulator_program(), ProgramOptions{.arguments = std::move(arguments), .input = {}});
+  };
+  const auto step = [](const char* second, const std::string& event, const char* iccid) {
+    return (event.empty() ? "{" : "{\"event\":\"" + event + "\",") + "\"state\":{\"iccid\":{\"Value\":\"" + iccid +
+           "\"}},\"time\":{\"$date\":\"2026-01-31T12:00:" + second + "Z\"}}\n";
+  };
+  std::ofstream(recording) << step("00", "", "1") << step("10", "sim-newly-inserted", "2")
+                           << step("10", "phone-number-changed", "2") << step("20", "sim-status-changed", "3");
+  run({"--replay", recording, "--speed", "50"});
+  ASSERT_TRUE(simulator_->wait_for_output("ready"));
+  const std::string again = root.outside() / "again";
+  Program recorder(control_program(), {.arguments = {"sim", "record", again}, .input = {}});
+  EXPECT_TRUE(simulator_->wait_for_output("played 4 steps"));
+  EXPECT_TRUE(eventually([&] { return without_times(again).size() == 4; }));
+  recorder.stop();
+  // The same but for the times, which are fifty times closer.
+  EXPECT_EQ(without_times(again), without_times(recording));
+  for (const char* wrong : {"", "{}", "garbage", R"({"time":{"$date":"2026-01-31T12:00:00Z"},"state":1})"}) {
+    std::ofstream(recording) << wrong;
+    EXPECT_EQ(run_to_end(simulator_program(), {"--replay", recording}).status, 66) << wrong;
+  }
+  const Outcome outcome = run_to_end(simulator_program(), {"--speed", "0"});
+  EXPECT_EQ(outcome.status, 64);
+  EXPECT_EQ(outcome.err, "telvane-sim: --speed is \"0\", but takes a number from 0.001 to 1000000\n");
 }
 
 TEST_F(TelvaneSim, ReplacesADeadOnesSocketAndRespectsALiveOnes) {
