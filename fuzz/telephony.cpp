@@ -59,7 +59,7 @@ void run_once(Bytes input) {
   static const Service service;
   Input parts(input.first(input.size() < 65536 ? input.size() : 65536));
   TelephonyStream stream;
-  require(stream.connect(), "no connection");
+  require(stream.connect() == TelephonyStream::Connection::open, "no connection");
   Descriptor peer = service.accept();
   const Bytes head = parts.take(parts.number(2));
   for (const Bytes part : {head, parts.rest()}) {

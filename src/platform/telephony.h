@@ -30,8 +30,9 @@ class TelephonyCenter;
 using TelephonyObserver = void (*)(TelephonyCenter* center, void* context, const PropertyValue& name,
                                    const PropertyValue& object, const PropertyValue& user_info) noexcept;
 
-/// The default notification center: exists when the service's socket could be connected at the first call, null for
-/// the life of the process when it could not. Borrowed.
+/// The default notification center: exists when the device has a telephony service, that is when
+/// /etc/quorvel/telephony is there or anything stands at the place of the service's socket at the first call; null for
+/// the life of the process otherwise. Bound to a run loop, it connects whenever the service can be reached. Borrowed.
 [[nodiscard]] TelephonyCenter* default_telephony_center() noexcept;
 
 /// Has the center's deliveries made on `loop`.

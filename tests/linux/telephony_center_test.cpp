@@ -1,4 +1,7 @@
 // The telephony layer against a service that is well-behaved, wrong, gone and back.
+#include <sys/socket.h>
+#include <sys/syscall.h>
+
 #include "platform/telephony.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
@@ -27,9 +30,13 @@ std::string everything() {
 
 class TelephonyService : public testing::Test {
  protected:
-  TelephonyService() {
+  struct Late {};
+
+  TelephonyService() : TelephonyService([this] { listener = listen_on("telvane.sock"); }) {}
+  explicit TelephonyService(Late) : TelephonyService([this] { root.write_file("/etc/quorvel/telephony", ""); }) {}
+  explicit TelephonyService(const std::function<void()>& prepare) {
     root.make_directory("/run/quorvel");
-    listener = listen_on("telvane.sock");
+    prepare();
     center = default_telephony_center();
     bind_to_run_loop(center, current_run_loop(), RunLoopMode::default_mode);
   }
@@ -103,33 +110,105 @@ TEST_F(TelephonyService, AnswersFromTheLastStateWhateverItHolds) {
 TEST_F(TelephonyService, ComesBackAfterAServiceThatLeftOrSentRubbish) {
   observe(kSimStatusChanged);
   const std::string good = event(dictionary({{"sim-status", dictionary({{"Value", "ready"}})}}));
-  const std::string rubbish[] = {
-      "",                                               // leaves at once
-      good.substr(0, good.size() / 2),                  // leaves in the middle
-      std::string(16, '\xff'),                          // no frame
-      frame_bytes(FrameKind::notification, 0, "name"),  // a frame of somebody else
-      event(array({1})),                                // a state that is no dictionary
-      event(nullptr),                                   // no state
+  const struct {
+    std::string bytes;
+    std::string told;
+  } rubbish[] = {
+      {"", "left"},
+      {good.substr(0, good.size() / 2), ""},  // leaves in the middle: the same reason, told once a minute
+      {std::string(16, '\xff'), "sent no frame: kind 255"},
+      {frame_bytes(FrameKind::notification, 0, "name"), "sent neither a state nor an event: frame of kind 5"},
+      {event(array({1})), "sent a state that is no readable property list with a dictionary at its root"},
+      {event(nullptr), "sent no state"},
+      {std::string("\x20\0\0\0\7\0\0\0\0\0\0\0\0\0\0\0", 16), "body of 536870912 bytes"},
   };
+  testing::internal::CaptureStderr();
   serve([&] {
     std::size_t rounds = 0;
-    for (const std::string& bytes : rubbish) {
+    for (const auto& [bytes, told] : rubbish) {
       SocketPeer peer = accept_from(listener);
       EXPECT_TRUE(peer.send(good + bytes));
       EXPECT_TRUE(wait_for_deliveries(++rounds));
       EXPECT_TRUE(rounds <= 2 || peer.is_closed());
     }
   });
+  const std::string printed = testing::internal::GetCapturedStderr();
+  for (const auto& [bytes, told] : rubbish) EXPECT_NE(printed.find(told), std::string::npos) << told << '\n' << printed;
+  EXPECT_EQ(std::count(printed.begin(), printed.end(), '\n'), static_cast<std::ptrdiff_t>(std::size(rubbish)) - 1)
+      << printed;
   EXPECT_EQ(seen.size(), std::size(rubbish));
   EXPECT_EQ(seen.back(), "sim-status-changed: sim ready, iccid (null) 0.0, postponement (null) 0.0");
+  EXPECT_EQ(everything(), "sim (null), no connection");
 }
 
-TEST(TelephonyCenter, OnlyTheOwnerOfTheDirectoryIsTheService) {
-  if (::geteuid() != 0) GTEST_SKIP() << "another owner needs root";
+TEST_F(TelephonyService, DeliversABurstThatArrivesAtOnce) {
+  observe(kSimStatusChanged);
+  std::string burst;
+  for (int i = 0; i < 40; ++i) burst += event(dictionary({}));
+  serve([&] {
+    SocketPeer peer = accept_from(listener);
+    EXPECT_TRUE(peer.send(burst) && wait_for_deliveries(40));
+  });
+}
+
+// A device whose service is not there when the daemon starts.
+class LateTelephonyService : public TelephonyService {
+ protected:
+  LateTelephonyService() : TelephonyService(Late()) {}
+  void serve_once() {
+    listener = listen_on("telvane.sock");
+    SocketPeer peer = accept_from(listener);
+    EXPECT_TRUE(peer.send(event(dictionary({{"sim-status", dictionary({{"Value", "ready"}})}}))));
+    EXPECT_TRUE(wait_for_deliveries(1));
+  }
+};
+
+TEST_F(LateTelephonyService, IsFollowedWhenItComes) {
+  observe(kSimStatusChanged);
+  testing::internal::CaptureStderr();
+  serve([&] {
+    std::this_thread::sleep_for(50ms);
+    root.write_file("/run/quorvel/other.sock", "");
+    root.write_file("/run/quorvel/telvane.sock", "");  // no socket, which the daemon finds
+    std::this_thread::sleep_for(50ms);
+    serve_once();
+  });
+  const std::string printed = testing::internal::GetCapturedStderr();
+  EXPECT_NE(printed.find("telvane.sock as user"), std::string::npos) << printed;
+}
+
+TEST_F(LateTelephonyService, IsFoundInADirectoryThatWasMadeAnew) {
+  observe(kSimStatusChanged);
+  testing::internal::CaptureStderr();
+  serve([&] {
+    std::filesystem::rename(root.path("/run/quorvel"), root.path("/run/old"));
+    root.make_directory("/run/quorvel");
+    serve_once();
+  });
+  EXPECT_NE(testing::internal::GetCapturedStderr(), "");
+}
+
+TEST_F(LateTelephonyService, OfAnotherUserIsNotBelieved) {
+  if (::geteuid() != 0) GTEST_SKIP() << "another user needs root";
+  testing::internal::CaptureStderr();
+  serve([&] {
+    // A socket is the user's who listened last.
+    const Descriptor stranger = listen_on("stranger.sock");
+    ASSERT_EQ(::syscall(SYS_setresuid, -1, 12345, -1), 0);  // of this thread alone
+    EXPECT_EQ(::listen(stranger.get(), 1), 0);
+    ASSERT_EQ(::syscall(SYS_setresuid, -1, 0, -1), 0);
+    std::filesystem::rename(root.path("/run/quorvel/stranger.sock"), root.path("/run/quorvel/telvane.sock"));
+    EXPECT_TRUE(accept_from(stranger).is_closed());
+  });
+  const std::string printed = testing::internal::GetCapturedStderr();
+  EXPECT_NE(printed.find("of user 12345; only root and user 0, who owns /run/quorvel, are believed"), std::string::npos)
+      << printed;
+  EXPECT_EQ(everything(), "sim (null), no connection");
+}
+
+TEST(TelephonyCenter, DoesNotExistOnADeviceWithoutTelephony) {
   ScratchRoot root;
   root.make_directory("/run/quorvel");
-  const Descriptor listener = listen_on("telvane.sock");
-  ASSERT_EQ(::chown(root.path("/run/quorvel").c_str(), 12345, 12345), 0);
   EXPECT_EQ(default_telephony_center(), nullptr);
   EXPECT_FALSE(TelephonyConnection::open(nullptr, nullptr));
   EXPECT_EQ(copy_sim_status(), PropertyValue());

@@ -1,18 +1,32 @@
 #include "linux/telephony/telephony_center.h"
 
+#include <fcntl.h>
+#include <sys/inotify.h>
 #include <sys/timerfd.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
+#include <cstdio>
 #include <new>
+#include <string_view>
+#include <utility>
 
+#include "linux/base/error_line.h"
+#include "linux/base/local_socket.h"
+#include "linux/telephony/telephony_trouble.h"
+#include "platform/file_system.h"
+#include "wire/service_path.h"
 #include "wire/telephony_answers.h"
 
 namespace quorvel::platform {
 
 namespace {
 
-// Pauses between attempts to reach a service that went away.
+// A device with this file has a telephony service, though perhaps not yet.
+constexpr char kTelephonyMark[] = "/etc/quorvel/telephony";
+
+// Pauses between attempts to reach a service that is there but does not answer, in milliseconds.
 constexpr int kFirstDelay = 100;
 constexpr int kLongestDelay = 2000;
 
@@ -26,17 +40,63 @@ bool asked_before = false;
 
 bool TelephonyCenter::start() noexcept {
   timer_ = Descriptor(::timerfd_create(CLOCK_MONOTONIC, TFD_CLOEXEC | TFD_NONBLOCK));
+  directory_ = Descriptor(::inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
   delay_ = kFirstDelay;
-  return timer_ && stream_.connect();
+  return static_cast<bool>(timer_);
 }
 
 void TelephonyCenter::bind(RunLoop* loop) noexcept {
   if (loop == nullptr || loop_ != nullptr) return;
   timer_source_ = {timer_.get(), try_again, this};
-  // The service is not kept waiting for an observer that never reads.
-  if (!loop->add(timer_source_, EPOLLIN)) return stream_.close();
+  directory_source_ = {directory_.get(), serve_directory, this};
+  if (!loop->add(timer_source_, EPOLLIN)) return;
   loop_ = loop;
-  watch_stream();
+  if (directory_ && !loop->add(directory_source_, EPOLLIN)) directory_ = Descriptor();
+  watch_directory();
+  look_for_service();
+}
+
+// Without a watch the service is looked for by timer.
+void TelephonyCenter::watch_directory() noexcept {
+  if (directory_watch_ >= 0) return;
+  const Descriptor directory = host::open_service_directory();
+  char path[32];
+  std::snprintf(path, sizeof path, "/proc/self/fd/%d", directory.get());
+  if (directory) {
+    directory_watch_ = ::inotify_add_watch(
+        directory_.get(), path, IN_CREATE | IN_MOVED_TO | IN_ATTRIB | IN_MOVE_SELF | IN_DELETE_SELF | IN_ONLYDIR);
+  }
+  if (directory_watch_ < 0 && host::should_tell(host::TelephonyTrouble::directory, errno)) {
+    host::print_system_error("cannot watch %s for the telephony service", wire::kServiceDirectory.data());
+  }
+}
+
+void TelephonyCenter::serve_directory(void* context) noexcept {
+  auto& center = *static_cast<TelephonyCenter*>(context);
+  alignas(inotify_event) char events[4096];
+  const ssize_t size = ::read(center.directory_.get(), events, sizeof events);
+  bool has_changed = false;
+  for (ssize_t at = 0; at < size;) {
+    const auto& event = *reinterpret_cast<const inotify_event*>(events + at);
+    at += static_cast<ssize_t>(sizeof event + event.len);
+    has_changed |= event.len == 0 || std::string_view(event.name) == wire::kTelephonySocket;
+    // The directory is not at its place any more; the timer finds its successor.
+    if ((event.mask & (IN_MOVE_SELF | IN_DELETE_SELF)) != 0 && center.directory_watch_ >= 0) {
+      ::inotify_rm_watch(center.directory_.get(), std::exchange(center.directory_watch_, -1));
+    }
+  }
+  if (!has_changed || center.stream_.is_open()) return;
+  center.delay_ = kFirstDelay;
+  center.look_for_service();
+}
+
+void TelephonyCenter::look_for_service() noexcept {
+  switch (stream_.connect()) {
+    case host::TelephonyStream::Connection::open: return watch_stream();
+    case host::TelephonyStream::Connection::busy: return schedule_try();
+    case host::TelephonyStream::Connection::absent: break;
+  }
+  if (directory_watch_ < 0) schedule_try();
 }
 
 bool TelephonyCenter::add_observer(void* context, TelephonyObserver observer, const PropertyValue& name) noexcept {
@@ -69,7 +129,10 @@ void TelephonyCenter::serve_stream(void* context) noexcept {
 // False for what the service cannot have meant to send, and when memory runs out.
 bool TelephonyCenter::handle(const wire::Frame& frame) noexcept {
   PropertyValue state = wire::state_of(frame);
-  if (!state) return false;
+  if (!state) {
+    stream_.tell_unusable(frame);
+    return false;
+  }
   state_ = std::move(state);
   delay_ = kFirstDelay;
   if (frame.head.kind == wire::FrameKind::event) deliver(frame.name);
@@ -103,11 +166,9 @@ void TelephonyCenter::try_again(void* context) noexcept {
   auto& center = *static_cast<TelephonyCenter*>(context);
   std::uint64_t expirations;
   if (::read(center.timer_.get(), &expirations, sizeof expirations) < 0) return;
-  if (center.stream_.connect()) {
-    center.watch_stream();
-  } else {
-    center.schedule_try();
-  }
+  if (center.stream_.is_open()) return;
+  center.watch_directory();
+  center.look_for_service();
 }
 
 TelephonyCenter* existing_telephony_center() noexcept { return the_center; }
@@ -115,6 +176,7 @@ TelephonyCenter* existing_telephony_center() noexcept { return the_center; }
 TelephonyCenter* default_telephony_center() noexcept {
   if (asked_before) return the_center;
   asked_before = true;
+  if (!Descriptor(open_file(kTelephonyMark, O_PATH, 0)) && !host::TelephonyStream::has_place()) return nullptr;
   the_center = new (std::nothrow) TelephonyCenter;
   if (the_center != nullptr && !the_center->start()) {
     delete the_center;

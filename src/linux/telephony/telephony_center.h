@@ -17,8 +17,9 @@ class TelephonyCenter {
   TelephonyCenter(const TelephonyCenter&) = delete;
   TelephonyCenter& operator=(const TelephonyCenter&) = delete;
 
-  /// Connects for the first time. False when the service is not there.
+  /// False when the center cannot be made.
   [[nodiscard]] bool start() noexcept;
+  /// Has everything served by `loop`, and looks for the service for the first time.
   void bind(RunLoop* loop) noexcept;
   [[nodiscard]] bool add_observer(void* context, TelephonyObserver observer, const PropertyValue& name) noexcept;
 
@@ -37,14 +38,20 @@ class TelephonyCenter {
   static void try_again(void* center) noexcept;
   [[nodiscard]] bool handle(const wire::Frame& frame) noexcept;
   void deliver(std::string_view name) noexcept;
+  static void serve_directory(void* center) noexcept;
+  void watch_directory() noexcept;
+  void look_for_service() noexcept;
   void watch_stream() noexcept;
   void lose_service() noexcept;
   void schedule_try() noexcept;
 
   host::TelephonyStream stream_;
   Descriptor timer_;
+  Descriptor directory_;      // tells of changes in the service directory
+  int directory_watch_ = -1;  // -1 while it is not watched
   RunLoopSource stream_source_;
   RunLoopSource timer_source_;
+  RunLoopSource directory_source_;
   RunLoop* loop_ = nullptr;
   int delay_ = 0;  // milliseconds before the next attempt to connect
   PropertyValue state_;

@@ -2,11 +2,17 @@
 
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <cstring>
+#include <string_view>
 
+#include "linux/base/error_line.h"
 #include "linux/base/local_socket.h"
+#include "linux/telephony/telephony_trouble.h"
+#include "platform/file_system.h"
 #include "wire/service_path.h"
 #include "wire/telephony_state.h"
 
@@ -16,24 +22,68 @@ namespace {
 
 constexpr std::size_t kReceiveSize = 64u << 10;
 
-[[nodiscard]] bool is_owned_by_peer(int directory, int socket) noexcept {
-  struct stat status;
-  ucred peer;
-  socklen_t length = sizeof peer;
-  return ::fstat(directory, &status) == 0 && ::getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &peer, &length) == 0 &&
-         peer.uid == status.st_uid;
+constexpr char kPath[] = "/run/quorvel/telvane.sock";
+static_assert(std::string_view(kPath).starts_with(wire::kServiceDirectory) &&
+              std::string_view(kPath).ends_with(wire::kTelephonySocket));
+
+// True for an error that passes without anything changing in the service directory.
+[[nodiscard]] bool may_pass(int error) noexcept {
+  return error != ENOENT && error != EACCES && error != EPERM && error != EPROTOTYPE && error != ELOOP;
+}
+
+void tell_unreachable(int error) noexcept {
+  if (!should_tell(TelephonyTrouble::connection, error)) return;
+  errno = error;
+  print_system_error("cannot connect to the telephony service on %s as user %u", kPath, ::geteuid());
 }
 
 }  // namespace
 
-bool TelephonyStream::connect() noexcept {
+bool TelephonyStream::has_place() noexcept {
+  return static_cast<bool>(Descriptor(open_file(kPath, O_PATH | O_NOFOLLOW, 0)));
+}
+
+bool TelephonyStream::is_trusted(int directory, int socket) noexcept {
+  struct stat status;
+  ucred peer;
+  socklen_t length = sizeof peer;
+  if (::fstat(directory, &status) != 0 || ::getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &peer, &length) != 0) {
+    return false;
+  }
+  process_ = peer.pid;
+  user_ = peer.uid;
+  if (peer.uid == 0 || peer.uid == status.st_uid) return true;
+  if (should_tell(TelephonyTrouble::trust, static_cast<int>(peer.uid))) {
+    print_error_line("%s is served by process %d of user %u; only root and user %u, who owns %s, are believed", kPath,
+                     peer.pid, peer.uid, status.st_uid, wire::kServiceDirectory.data());
+  }
+  return false;
+}
+
+TelephonyStream::Connection TelephonyStream::connect() noexcept {
   const Descriptor directory = open_service_directory();
-  if (!directory) return false;
-  Descriptor socket = connect_local(wire::kTelephonySocket);
-  if (!socket || !is_owned_by_peer(directory.get(), socket.get())) return false;
+  Descriptor socket = directory ? connect_local(wire::kTelephonySocket) : Descriptor();
+  if (!socket) {
+    const int error = errno;
+    tell_unreachable(error);
+    return may_pass(error) ? Connection::busy : Connection::absent;
+  }
+  if (!is_trusted(directory.get(), socket.get())) return Connection::absent;
   close();
   socket_ = std::move(socket);
-  return true;
+  return Connection::open;
+}
+
+void TelephonyStream::tell_unusable(const wire::Frame& frame) const noexcept {
+  const auto kind = static_cast<unsigned>(frame.head.kind);
+  const bool is_foreign = frame.head.kind != wire::FrameKind::state && frame.head.kind != wire::FrameKind::event;
+  if (!should_tell(TelephonyTrouble::state, is_foreign ? 1 : frame.payload.empty() ? 2 : 3)) return;
+  const char* fault = is_foreign ? "neither a state nor an event"
+                      : frame.payload.empty()
+                          ? "no state"
+                          : "a state that is no readable property list with a dictionary at its root";
+  print_error_line("the telephony service on %s (process %d, user %u) sent %s: frame of kind %u, %zu bytes", kPath,
+                   process_, user_, fault, kind, frame.payload.size());
 }
 
 void TelephonyStream::close() noexcept {
@@ -56,6 +106,13 @@ TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept
     case wire::FrameResult::incomplete: return Result::nothing;
     case wire::FrameResult::refused: break;
   }
+  if (should_tell(TelephonyTrouble::frame, frame.head.kind > wire::FrameKind::event)) {
+    print_error_line(
+        "the telephony service on %s (process %d, user %u) sent no frame: kind %u, flags %u, name of %u bytes, body of "
+        "%u bytes (at most %u)",
+        kPath, process_, user_, static_cast<unsigned>(frame.head.kind), unsigned{frame.head.flags},
+        unsigned{frame.head.name_length}, frame.head.body_length, wire::kMaximumStateBody);
+  }
   return Result::gone;
 }
 
@@ -76,7 +133,12 @@ TelephonyStream::Result TelephonyStream::receive() noexcept {
   const int error = errno;
   static_cast<void>(input_.resize(size + static_cast<std::size_t>(std::max<ssize_t>(count, 0))));
   if (count > 0) return Result::frame;
-  return count < 0 && (error == EAGAIN || error == EINTR) ? Result::nothing : Result::gone;
+  if (count < 0 && (error == EAGAIN || error == EINTR)) return Result::nothing;
+  if (should_tell(TelephonyTrouble::loss, count == 0 ? 0 : error)) {
+    print_error_line("the telephony service on %s (process %d, user %u) left%s%s", kPath, process_, user_,
+                     count == 0 ? "" : ": ", count == 0 ? "" : ::strerrordesc_np(error));
+  }
+  return Result::gone;
 }
 
 }  // namespace quorvel::platform::host

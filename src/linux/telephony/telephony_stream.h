@@ -1,5 +1,8 @@
-// The connection to the telephony service: frames that grow as their bytes arrive.
+// The connection to the telephony service: frames that grow as their bytes arrive. Whatever keeps the daemon from its
+// service is told on standard error. Main thread only.
 #pragma once
+
+#include <sys/types.h>
 
 #include <cstddef>
 
@@ -12,10 +15,14 @@ namespace quorvel::platform::host {
 class TelephonyStream {
  public:
   enum class Result { frame, nothing, gone };
+  /// `absent`: nothing will be there before the service directory changes. `busy`: trying again may help.
+  enum class Connection { open, absent, busy };
 
-  /// Connects, without waiting. Only the owner of the service directory is taken for the service. False when it is not
-  /// there.
-  [[nodiscard]] bool connect() noexcept;
+  /// True when something, whatever it is, stands at the place of the service's socket.
+  [[nodiscard]] static bool has_place() noexcept;
+
+  /// Connects, without waiting. Only root and the owner of the service directory are taken for the service.
+  [[nodiscard]] Connection connect() noexcept;
   void close() noexcept;
   [[nodiscard]] bool is_open() const noexcept { return static_cast<bool>(socket_); }
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
@@ -24,12 +31,18 @@ class TelephonyStream {
   /// cannot be a frame.
   [[nodiscard]] Result next(wire::Frame& frame) noexcept;
 
+  /// Tells that the service sent `frame`, which holds no state.
+  void tell_unusable(const wire::Frame& frame) const noexcept;
+
  private:
+  [[nodiscard]] bool is_trusted(int directory, int socket) noexcept;
   [[nodiscard]] Result take_frame(wire::Frame& frame) noexcept;
   [[nodiscard]] Result receive() noexcept;
   void drop_taken() noexcept;
 
   Descriptor socket_;
+  pid_t process_ = 0;  // who listens, for the texts
+  uid_t user_ = 0;
   ByteBuffer input_;
   std::size_t taken_ = 0;  // how much of the input has been handed out
 };
