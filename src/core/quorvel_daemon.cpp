@@ -1,25 +1,19 @@
 #include "core/quorvel_daemon.h"
 
-#include <cstdio>
-#include <cstring>
 #include <utility>
 
 #include "files/property_list_file.h"
-#include "files/value_helpers.h"
 #include "log/daemon_log.h"
+#include "platform/device_paths.h"
 #include "protocol/quorvel_protocol.h"
 
 namespace quorvel {
 namespace {
 
 PropertyValue copy_regulatory_images() noexcept {
-  char path[1024 + 1];
-  mobile_home_path(path);
-  const std::size_t home = std::strlen(path);
-  std::snprintf(path + home, sizeof path - home, "%s/%s", "/Library/qvd/regulatory_images", "regulatory_images.plist");
-  PropertyValue images = load_dict(path);
+  PropertyValue images = load_dict(paths::kRegulatoryImages);
   if (images && !images.is_dictionary()) {
-    daemon_log(0, protocol::kCopyRegulatoryImages.data(), "%s does not hold a dictionary", path);
+    daemon_log(0, protocol::kCopyRegulatoryImages.data(), "%s does not hold a dictionary", paths::kRegulatoryImages);
     images = nullptr;
   }
   return images;

@@ -4,15 +4,13 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <cstring>
 
 #include "device/telephony_facts.h"
 #include "files/error_text.h"
 #include "files/safe_open.h"
-#include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/descriptor.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "platform/process.h"
 #include "store/standard_key_classes.h"
@@ -45,12 +43,8 @@ void set_state_directory_mode(const char* path) noexcept {
 }  // namespace
 
 DataArk* quorveld_startup() noexcept {
-  char path[1024 + 1];
-  mobile_home_path(path);
-  const std::size_t home = std::strlen(path);
-  std::snprintf(path + home, sizeof path - home, "/Library/qvd");
-  make_state_directory(path);
-  set_state_directory_mode(path);
+  make_state_directory(paths::kStateDirectory);
+  set_state_directory_mode(paths::kStateDirectory);
   DataArk* ark = data_ark_load();
   if (ark == nullptr) platform::end_process("no memory or lock for the data ark", 71);
   apply_standard_key_classes(ark);

@@ -8,6 +8,7 @@
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/device_information.h"
+#include "platform/device_questions.h"
 #include "platform/hardware_registry.h"
 #include "platform/preferences.h"
 
@@ -47,7 +48,7 @@ bool preference_overrides() noexcept {
 }
 
 void ask_product_type(DeviceTypeInfo& info) noexcept {
-  info.product_type = as_string(platform::copy_device_answer("ProductType"));
+  info.product_type = as_string(platform::copy_device_answer(platform::QuestionName("ProductType")));
   if (!contains_ignoring_case(info.product_type.text(), kBoardMarker)) return;
   const PropertyValue machine = kMachineType;
   daemon_log(0, kLabel, "This is an FPGA, faking out product type as %@", machine);
@@ -70,7 +71,7 @@ DeviceTypeInfo detect() noexcept {
   if (info.machine_override) {
     take_fixed_values(info);
   } else {
-    info.has_telephony = platform::copy_device_answer("HasBaseband").to_boolean();
+    info.has_telephony = platform::copy_device_answer(platform::QuestionName("HasBaseband")).to_boolean();
     info.baseband_class = getDeviceTreeInt(kBasebandEntry, kClassProperty);
   }
   daemon_log(0, kLabel, "product_type: %@\n", info.product_type);

@@ -1,8 +1,9 @@
 #include "files/value_helpers.h"
 
-#include <cstdio>
+#include <cstring>
 
 #include "log/daemon_log.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "platform/process.h"
 
@@ -31,6 +32,9 @@ const PropertyValue& as_string(const PropertyValue& value) noexcept {
   return value.is_string() ? value : borrowed(kNone);
 }
 
-void mobile_home_path(char* buffer) noexcept { std::snprintf(buffer, platform::kPathSize, "/private/var/mobile"); }
+void mobile_home_path(char* buffer) noexcept {
+  static_assert(sizeof paths::kMobileHome <= platform::kPathSize);
+  std::memcpy(buffer, paths::kMobileHome, sizeof paths::kMobileHome);
+}
 
 }  // namespace quorvel

@@ -2,6 +2,7 @@
 
 #include "log/daemon_log.h"
 #include "platform/device_information.h"
+#include "platform/device_questions.h"
 #include "platform/preferences.h"
 
 namespace quorvel {
@@ -9,7 +10,7 @@ namespace quorvel {
 int extended_logging = 1;
 
 void setup_extended_logging() noexcept {
-  if (platform::copy_device_answer("ReleaseType").text() == "Internal") {
+  if (platform::copy_device_answer(platform::QuestionName("ReleaseType")).text() == "Internal") {
     extended_logging = 1;
     return;
   }

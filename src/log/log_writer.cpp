@@ -10,6 +10,7 @@
 
 #include "log/trouble_report.h"
 #include "platform/descriptor.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "platform/lock.h"
 
@@ -28,23 +29,23 @@ std::int64_t byte_count QUORVEL_GUARDED_BY(log_lock) = 0;
 // O_NONBLOCK: a FIFO at the log's path must not stop the thread that opens it.
 Descriptor open_log() noexcept {
   Descriptor file(
-      platform::open_file(kLogPath, O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_NONBLOCK, kCreationMode));
+      platform::open_file(paths::kLogFile, O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_NONBLOCK, kCreationMode));
   if (!file) {
-    report_log_trouble("open", kLogPath);
+    report_log_trouble("open", paths::kLogFile);
     return {};
   }
   char path[platform::kPathSize];
   if (platform::descriptor_path(file.get(), path, sizeof path) != 0) {
-    report_log_trouble("descriptor path", kLogPath);
+    report_log_trouble("descriptor path", paths::kLogFile);
     return {};
   }
   struct stat status {};
   if (fstat(file.get(), &status) != 0) {
-    report_log_trouble("fstat", kLogPath);
+    report_log_trouble("fstat", paths::kLogFile);
     return {};
   }
   if ((status.st_mode & kTypeMask) != kRegular) {
-    report_log_type(kLogPath, status.st_mode & kTypeMask, kRegular);
+    report_log_type(paths::kLogFile, status.st_mode & kTypeMask, kRegular);
     return {};
   }
   fcntl(file.get(), F_SETFL, O_APPEND);
@@ -89,10 +90,10 @@ void log_write_line(const char* line) noexcept {
   } while (written < 0 && errno == EINTR);
   if (written != static_cast<ssize_t>(length)) {
     if (written >= 0) errno = ENOSPC;
-    report_log_trouble("write", kLogPath);
+    report_log_trouble("write", paths::kLogFile);
   }
   byte_count += static_cast<std::int64_t>(length);
-  if (log_rotate_if_needed(kLogPath, byte_count) == 1) close_log();
+  if (log_rotate_if_needed(paths::kLogFile, byte_count) == 1) close_log();
 }
 
 }  // namespace quorvel

@@ -5,7 +5,6 @@
 
 namespace quorvel {
 
-inline constexpr const char* kLogPath = "/var/mobile/Library/Logs/quorveld.log";
 inline constexpr std::int64_t kRotationThreshold = 1'048'576;
 
 /// Appends one finished line, its newline included, under the log lock, opening the file first when it is closed and

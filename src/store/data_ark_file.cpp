@@ -11,6 +11,7 @@
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/descriptor.h"
+#include "platform/device_paths.h"
 #include "store/data_ark.h"
 #include "store/data_ark_record.h"
 
@@ -89,9 +90,7 @@ void replace_data_file(DataArk& ark, const DataArkPaths& paths, const OmittedEnt
 }  // namespace
 
 DataArkPaths::DataArkPaths() noexcept {
-  char home[platform::kPathSize];
-  mobile_home_path(home);
-  compose(directory, home, "/Library/qvd");
+  compose(directory, paths::kStateDirectory, "");
   compose(file, directory, "/data_ark.plist");
   compose(temporary, file, ".XXXXXX");
   compose(set_aside, file, ".unreadable");

@@ -4,6 +4,7 @@
 #include <array>
 #include <string_view>
 
+#include "platform/device_questions.h"
 #include "store/key_names.h"
 
 namespace quorvel {
@@ -20,16 +21,18 @@ inline constexpr std::string_view kQuestionNamePrefix = "kVeritomeQ";
 
 namespace detail {
 
+using platform::QuestionName;
+
 template <std::size_t Size>
 consteval larry_info ask(const StaticText<Size>& key) {
-  return {{}, key.text(), key.text(), {}};
+  return {{}, key.text(), QuestionName(key.text()), {}};
 }
 template <std::size_t Size>
-consteval larry_info ask(const StaticText<Size>& key, std::string_view question, std::string_view question_name = {}) {
+consteval larry_info ask(const StaticText<Size>& key, QuestionName question, std::string_view question_name = {}) {
   return {{}, key.text(), question, question_name};
 }
 template <std::size_t DomainSize, std::size_t Size>
-consteval larry_info ask(const StaticText<DomainSize>& domain, const StaticText<Size>& key, std::string_view question,
+consteval larry_info ask(const StaticText<DomainSize>& domain, const StaticText<Size>& key, QuestionName question,
                          std::string_view question_name = {}) {
   return {domain.text(), key.text(), question, question_name};
 }

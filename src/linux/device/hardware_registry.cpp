@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "linux/base/small_file.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 
 namespace quorvel::platform {
@@ -38,8 +39,7 @@ RegistryEntry RegistryEntry::open(const char* path) noexcept {
   const std::string_view name(path);
   if (!name.starts_with(kPlane)) return entry;
   char directory[kPathSize];
-  const int length =
-      std::snprintf(directory, sizeof directory, "/sys/firmware/devicetree/base/%s", path + kPlane.size());
+  const int length = std::snprintf(directory, sizeof directory, "%s/%s", paths::kDeviceTree, path + kPlane.size());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof directory) return entry;
   entry.directory_ = Descriptor(open_file(directory, O_PATH | O_DIRECTORY, 0));
   return entry;

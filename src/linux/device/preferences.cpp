@@ -3,6 +3,7 @@
 #include <cstdio>
 
 #include "linux/base/small_file.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 
 namespace quorvel::platform {
@@ -11,7 +12,7 @@ PropertyValue copy_preference(std::string_view key, std::string_view domain) noe
   if (domain.empty() || domain.find_first_of(std::string_view("/\0", 2)) != std::string_view::npos) return nullptr;
   if (domain.size() >= kPathSize) return nullptr;
   char path[kPathSize];
-  const int length = std::snprintf(path, sizeof path, "/private/var/mobile/Library/Preferences/%.*s.plist",
+  const int length = std::snprintf(path, sizeof path, "%s/%.*s.plist", paths::kPreferencesDirectory,
                                    static_cast<int>(domain.size()), domain.data());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof path) return nullptr;
   return host::read_file_entry(path, key);
