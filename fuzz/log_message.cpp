@@ -50,7 +50,7 @@ void run_once(Bytes bytes) {
   static_cast<void>(format_message(format.c_str(), arguments, sink));
   const std::string_view message(room.get(), static_cast<std::size_t>(sink.position() - room.get()));
   // Formats are the daemon's own. With a sound one, whatever the arguments are, a message is one line of sound text.
-  const auto is_control = [](char c) { return (c >= 0 && c < ' ') || c == '\x7f'; };
+  const auto is_control = [](char c) { return static_cast<unsigned char>(c) < ' ' || c == '\x7f'; };
   if (std::ranges::any_of(format, is_control) || !PropertyValue::string(format)) return;
   require(std::ranges::none_of(message, is_control), "an argument breaks its line");
   require(static_cast<bool>(PropertyValue::string(message)), "a message is no text");

@@ -11,6 +11,7 @@ declare -A packages=(
   [bench]="libbenchmark-dev pkg-config gnuplot-nox"
   [package]="dpkg-dev debhelper fakeroot lintian"
   [cross-arm64]="g++-aarch64-linux-gnu"
+  [arm64]="qemu-system-arm cpio"
   [elsewhere]="debootstrap"
   [installed]="debootstrap systemd-container"
   # The contenders of the benchmarks.

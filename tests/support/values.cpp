@@ -47,7 +47,8 @@ const char* round_trip_fault(const PropertyValue& value) {
   char room[512];
   TextSink sink(room);
   describe(value, sink);
-  if (std::any_of(room, sink.position(), [](char c) { return c >= 0 && c < ' '; })) return "breaks its line";
+  if (std::any_of(room, sink.position(), [](char c) { return static_cast<unsigned char>(c) < ' '; }))
+    return "breaks its line";
   if (value.is_container() && !(value.mutable_copy() == value)) return "its mutable copy differs";
   ByteBuffer once, twice;
   if (!write_binary(value, once)) return "cannot be written";

@@ -28,7 +28,7 @@ void use_device_root(const std::optional<std::string>& directory, int status) {
     }
   }
   if (Descriptor(platform::open_file("/", O_PATH | O_DIRECTORY, 0))) return;
-  if (errno == ENOSYS) throw Failure{status, "A device root needs Linux 5.6 or later"};
+  if (errno == ENOSYS) throw Failure{directory ? status : kBadConfiguration, "A device root needs Linux 5.6 or later"};
   const std::string reason = std::strerror(errno);
   if (directory) {
     throw Failure{status, "--root \"" + *directory + "\": " + reason +

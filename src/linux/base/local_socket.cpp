@@ -115,12 +115,13 @@ bool ListeningSocket::bind_and_listen(std::string_view name, mode_t mode) noexce
   if (::bind(socket_.get(), address.get(), address.length) != 0) return false;
   struct stat status;
   // A service that runs as root serves the directory's owner.
-  if (::geteuid() == 0 && ::fstat(directory_.get(), &status) == 0) {
-    static_cast<void>(::fchownat(directory_.get(), unfinished, status.st_uid, status.st_gid, AT_SYMLINK_NOFOLLOW));
-  }
+  const bool is_the_owners =
+      ::geteuid() != 0 || (::fstat(directory_.get(), &status) == 0 &&
+                           (status.st_uid == 0 || ::fchownat(directory_.get(), unfinished, status.st_uid, status.st_gid,
+                                                             AT_SYMLINK_NOFOLLOW) == 0));
   // Nobody can connect before the mode is set, because nobody listens yet; renaming then puts the file in its place
   // ready for use, and in place of a stale one at the same moment.
-  if (::fchmodat(directory_.get(), unfinished, mode, 0) != 0 ||
+  if (!is_the_owners || ::fchmodat(directory_.get(), unfinished, mode, 0) != 0 ||
       ::fstatat(directory_.get(), unfinished, &status, AT_SYMLINK_NOFOLLOW) != 0 ||
       ::listen(socket_.get(), kBacklog) != 0 ||
       ::renameat(directory_.get(), unfinished, directory_.get(), name_) != 0) {
