@@ -61,7 +61,8 @@ struct IpcDelegate {
 };
 
 /// A listener for a service name, or null when memory runs out. The caller owns it and gives it back with
-/// `release_listener`, which stops its threads and closes its connections. Main thread.
+/// `release_listener`, which stops its threads and closes its connections; a thread that does not end within half a
+/// second is left behind with the listener. Main thread.
 [[nodiscard]] IpcListener* create_listener(std::string_view service_name) noexcept;
 void set_delegate(IpcListener* listener, IpcDelegate delegate) noexcept;
 /// Starts accepting. Returns 0; or after one line on standard error the exit status to end with: 69 when a live

@@ -1,4 +1,7 @@
 // The IPC service against real clients: well-behaved, odd and hostile.
+#include <sys/socket.h>
+#include <sys/uio.h>
+
 #include <thread>
 
 #include "platform/ipc.h"
@@ -124,6 +127,47 @@ TEST_F(IpcService, AnswersEveryCallAndKeepsTheConnection) {
   for (std::uint64_t number = 10; number < 2000; ++number) many += call("echo", number, text("pipelined"));
   ASSERT_TRUE(peer.send(many));
   for (std::uint64_t number = 10; number < 2000; ++number) ASSERT_EQ(peer.receive()->serial, number);
+}
+
+TEST_F(IpcService, RefusesAttachedDescriptorsWhereTheKernelCan) {
+  SocketPeer peer = client();
+  int none = 1;
+  socklen_t size = sizeof none;
+  constexpr int kPassRights = 83;
+  if (::getsockopt(peer.descriptor(), SOL_SOCKET, kPassRights, &none, &size) != 0)
+    GTEST_SKIP() << "this kernel cannot refuse descriptors";
+  std::string bytes = call("echo", 1);
+  iovec part = {bytes.data(), bytes.size()};
+  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
+  msghdr message = {};
+  message.msg_iov = &part;
+  message.msg_iovlen = 1;
+  message.msg_control = control;
+  message.msg_controllen = sizeof control;
+  cmsghdr* attached = CMSG_FIRSTHDR(&message);
+  attached->cmsg_level = SOL_SOCKET;
+  attached->cmsg_type = SCM_RIGHTS;
+  attached->cmsg_len = CMSG_LEN(sizeof(int));
+  const int attachment = STDERR_FILENO;
+  std::memcpy(CMSG_DATA(attached), &attachment, sizeof attachment);
+  EXPECT_EQ(::sendmsg(peer.descriptor(), &message, MSG_NOSIGNAL), -1);
+  EXPECT_EQ(errno, EPERM);
+  expect_served(peer);
+}
+
+// The thread that runs the operation does not come back in time; the process ends without it.
+TEST_F(IpcService, EndsWithoutAThreadThatDoesNotComeBack) {
+  stop();
+  const auto end_beside_a_stuck_operation = [&] {
+    start();
+    SocketPeer peer = client();
+    static_cast<void>(peer.send(call("meet", 1)));
+    if (!eventually([] { return callers_of_meet == 1; })) return 1;
+    const auto begin = std::chrono::steady_clock::now();
+    stop();
+    return std::chrono::steady_clock::now() - begin < 1s ? 0 : 2;
+  };
+  EXPECT_EXIT(::_exit(end_beside_a_stuck_operation()), testing::ExitedWithCode(0), "left behind");
 }
 
 TEST_F(IpcService, ARefusedFrameClosesItsConnectionAndNoOther) {

@@ -1,4 +1,5 @@
 // What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 
@@ -38,15 +39,67 @@ TEST(ProcessStart, SettlesWhatTheDaemonRestsOn) {
   root.remove("/run");
   const auto settled = [&] {
     ::close(STDIN_FILENO);
+    ::umask(077);
+    rlimit few = {256, 4096};
+    ::setrlimit(RLIMIT_NOFILE, &few);
     if (platform::start_process(kService) != 0) return 1;
+    if (::getrlimit(RLIMIT_NOFILE, &few) != 0 || few.rlim_cur != 4096) return 5;
+    if (root.mode_of("/run/quorvel/quorveld.lock") != 0600) return 6;
     struct stat input;
     if (::fstat(STDIN_FILENO, &input) != 0 || !S_ISCHR(input.st_mode)) return 2;
     if (root.mode_of("/run/quorvel") != 0755 || root.mode_of("/run/quorvel/notifications.sock") != 0666) return 3;
-    if (::raise(SIGPIPE) != 0 || ::raise(SIGXFSZ) != 0 || ::raise(SIGTERM) != 0) return 4;
+    if (::raise(SIGHUP) != 0 || ::raise(SIGPIPE) != 0 || ::raise(SIGXFSZ) != 0 || ::raise(SIGTERM) != 0) return 4;
     return 0;
   };
   EXPECT_EXIT(std::exit(settled()), ExitedWithCode(0), "^$");
   EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
+}
+
+TEST(ProcessStart, RefusesTooFewDescriptors) {
+  ScratchRoot root;
+  const auto start = [] {
+    const rlimit few = {23, 23};
+    ::setrlimit(RLIMIT_NOFILE, &few);
+    return platform::start_process(kService);
+  };
+  EXPECT_EXIT(std::exit(start()), ExitedWithCode(71),
+              "^quorveld: a limit of 23 descriptors is too low, 24 are needed\n$");
+}
+
+// Numbers beyond what was passed are the daemon's own, opened later, and never taken for a passed socket.
+TEST(ProcessStart, TakesTheFirstListeningSocketOfThoseThatWerePassed) {
+  ScratchRoot root;
+  const Descriptor datagram(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+  const Descriptor stream(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const Descriptor listening(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const sockaddr_un unnamed = {AF_UNIX, {}};
+  ASSERT_EQ(::bind(listening.get(), reinterpret_cast<const sockaddr*>(&unnamed), sizeof unnamed.sun_family), 0);
+  ASSERT_EQ(::listen(listening.get(), 1), 0);
+  const struct {
+    const char* count;
+    std::vector<int> passed;
+    int taken;  // its position, -1 for none
+    const char* line;
+  } cases[] = {
+      {"1", {listening.get()}, 0, "^$"},
+      {"3", {datagram.get(), stream.get(), listening.get()}, 2, "^$"},
+      {"2", {datagram.get(), stream.get()}, -1, "^quorveld: none of the 2 descriptors that were passed [^\n]*\n$"},
+      {"2147483647", {datagram.get()}, -1, "^quorveld: none of the 1024 descriptors [^\n]*\n$"},
+      {"x", {listening.get()}, -1, "^$"},
+  };
+  for (const auto& c : cases) {
+    const auto start = [&] {
+      int number = 3;
+      for (const int passed : c.passed) ::dup2(passed, number++);
+      ::closefrom(number);
+      ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1);
+      ::setenv("LISTEN_FDS", c.count, 1);
+      if (const int status = platform::start_process(kService); status != 0) return status;
+      const Descriptor taken = platform::host::take_passed_socket();
+      return taken.get() == (c.taken < 0 ? -1 : 3 + c.taken) ? 0 : 1;
+    };
+    EXPECT_EXIT(::_exit(start()), ExitedWithCode(0), c.line) << c.count;
+  }
 }
 
 TEST(ProcessStart, RefusesASecondInstance) {
@@ -81,7 +134,8 @@ TEST(ProcessStart, RootLeavesNothingInAnothersPlace) {
 
 TEST(ProcessStart, TellsTheServiceManagerInOneLineWhatItDoes) {
   sockaddr_un address = {AF_UNIX, {}};
-  const std::string name = "@quorvel-status-" + std::to_string(::getpid());
+  std::string name = "@quorvel-status-" + std::to_string(::getpid());
+  name.resize(sizeof address.sun_path, 'n');  // the longest there is
   name.copy(address.sun_path, name.size());
   address.sun_path[0] = '\0';
   const Descriptor manager(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
@@ -119,6 +173,12 @@ TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
     EXPECT_TRUE(platform::host::connect_local("inwards.sock"));
     EXPECT_FALSE(platform::host::connect_local("outwards.sock"));
   }
+  {
+    const ListeningSocket socket = ListeningSocket::open("b.sock");
+    root.remove("/run/quorvel/b.sock");
+    root.write_file("/run/quorvel/b.sock", "another's");
+  }
+  EXPECT_EQ(root.read_file("/run/quorvel/b.sock"), "another's");
   EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));
   EXPECT_FALSE(ListeningSocket::open(std::string(100, 'n')));
   EXPECT_EQ(errno, ENAMETOOLONG);

@@ -25,6 +25,9 @@ constexpr int kBacklog = 256;
 // The socket is made under this suffix and renamed when it is ready.
 constexpr std::string_view kUnfinishedSuffix = ".new";
 
+// SO_PASSRIGHTS, which the C library's headers do not know yet.
+constexpr int kPassRights = 83;
+
 struct LocalAddress {
   sockaddr_un address = {};
   socklen_t length = 0;
@@ -93,6 +96,13 @@ Descriptor connect_local(std::string_view name) noexcept {
   return result == 0 || errno == EISCONN ? std::move(socket) : Descriptor();
 }
 
+void refuse_attached_descriptors(int listener) noexcept {
+  const int error = errno;
+  constexpr int kNone = 0;
+  static_cast<void>(::setsockopt(listener, SOL_SOCKET, kPassRights, &kNone, sizeof kNone));
+  errno = error;
+}
+
 bool is_served(std::string_view name) noexcept { return connect_local(name) || errno == EAGAIN; }
 
 ListeningSocket& ListeningSocket::operator=(ListeningSocket&& other) noexcept {
@@ -113,6 +123,7 @@ bool ListeningSocket::bind_and_listen(std::string_view name, mode_t mode) noexce
   if (!may_replace(directory_.get(), unfinished)) return false;
   ::unlinkat(directory_.get(), unfinished, 0);
   if (::bind(socket_.get(), address.get(), address.length) != 0) return false;
+  refuse_attached_descriptors(socket_.get());
   struct stat status;
   // A service that runs as root serves the directory's owner.
   const bool is_the_owners =

@@ -19,6 +19,11 @@ namespace quorvel::platform::host {
 /// listener whose queue is full gives EAGAIN.
 [[nodiscard]] Descriptor connect_local(std::string_view name) noexcept;
 
+/// Has the kernel refuse descriptors that a client attaches to what it sends on `listener`, or on a socket accepted
+/// from it. The kernel would otherwise close them in the thread that receives or drops the message, and closing one can
+/// take as long as its owner wishes. Kernels before Linux 6.16 know no such refusal; nothing happens then. Any thread.
+void refuse_attached_descriptors(int listener) noexcept;
+
 /// True when somebody listens on the socket `name` in the service directory.
 [[nodiscard]] bool is_served(std::string_view name) noexcept;
 

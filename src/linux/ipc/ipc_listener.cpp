@@ -9,6 +9,7 @@
 #include <new>
 
 #include "linux/base/error_line.h"
+#include "linux/base/thread.h"
 #include "linux/process/service_manager.h"
 #include "wire/service_path.h"
 
@@ -32,6 +33,7 @@ bool IpcListener::set_service_name(std::string_view name) noexcept {
 
 int IpcListener::open_socket() noexcept {
   if (Descriptor passed = host::take_passed_socket()) {
+    host::refuse_attached_descriptors(passed.get());
     socket_ = host::ListeningSocket(std::move(passed));
     return 0;
   }
@@ -60,11 +62,14 @@ int IpcListener::start() noexcept {
   return status != 0 ? status : start_workers();
 }
 
-void IpcListener::stop() noexcept {
+bool IpcListener::stop() noexcept {
   socket_.remove_file();
   // All of them at once, so that none hands a new connection to one that has ended.
   for (host::IpcWorker& worker : workers_) worker.begin_to_stop();
-  for (host::IpcWorker& worker : workers_) worker.stop();
+  const timespec deadline = host::end_of_patience();
+  bool ended = true;
+  for (host::IpcWorker& worker : workers_) ended &= worker.wait_for_end(deadline);
+  return ended;
 }
 
 bool IpcListener::accepts(IpcConnection& connection) noexcept {
@@ -96,6 +101,12 @@ void set_delegate(IpcListener* listener, IpcDelegate delegate) noexcept { listen
 
 int resume(IpcListener* listener) noexcept { return listener->start(); }
 
-void release_listener(IpcListener* listener) noexcept { delete listener; }
+void release_listener(IpcListener* listener) noexcept {
+  if (listener->stop()) {
+    delete listener;
+  } else {
+    host::print_error_line("a thread of the IPC service does not end; it is left behind");
+  }
+}
 
 }  // namespace quorvel::platform

@@ -16,12 +16,15 @@ class IpcListener {
   IpcListener() noexcept = default;
   IpcListener(const IpcListener&) = delete;
   IpcListener& operator=(const IpcListener&) = delete;
-  ~IpcListener() { stop(); }
+  ~IpcListener() = default;
 
   [[nodiscard]] bool set_service_name(std::string_view name) noexcept;
   void set_delegate(IpcDelegate delegate) noexcept { delegate_ = delegate; }
   /// `resume` of the platform's interface.
   [[nodiscard]] int start() noexcept;
+  /// Takes the socket away and ends the threads. False when one of them does not come back: the listener then belongs
+  /// to it until the process ends. Main thread.
+  [[nodiscard]] bool stop() noexcept;
 
   /// For the workers, on their threads.
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
@@ -36,7 +39,6 @@ class IpcListener {
 
   [[nodiscard]] int open_socket() noexcept;
   [[nodiscard]] int start_workers() noexcept;
-  void stop() noexcept;
 
   char socket_name_[108] = {};
   IpcDelegate delegate_ = {};

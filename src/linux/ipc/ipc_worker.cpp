@@ -60,11 +60,9 @@ void IpcWorker::begin_to_stop() noexcept {
   if (started_) ::eventfd_write(wake_.get(), 1);
 }
 
-void IpcWorker::stop() noexcept {
-  if (!started_) return;
-  begin_to_stop();
-  ::pthread_join(thread_, nullptr);
-  started_ = false;
+bool IpcWorker::wait_for_end(const timespec& deadline) noexcept {
+  if (started_ && join_thread(thread_, deadline)) started_ = false;
+  return !started_;
 }
 
 void* IpcWorker::run_thread(void* worker) noexcept {

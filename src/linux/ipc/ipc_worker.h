@@ -36,8 +36,9 @@ class IpcWorker {
   [[nodiscard]] bool start() noexcept;
   /// Tells the thread to end: it lets nobody in any more, and has a tenth of a second for the calls that are under way.
   void begin_to_stop() noexcept;
-  /// The same, and waits for the thread's end.
-  void stop() noexcept;
+  /// Waits for the end of the thread, which was told to end. False when it has not ended by `deadline`: the worker and
+  /// its listener must then be left to it.
+  [[nodiscard]] bool wait_for_end(const timespec& deadline) noexcept;
 
   /// How many connections belong to this worker. Any thread.
   [[nodiscard]] std::size_t connection_count() const noexcept { return count_.load(std::memory_order_relaxed); }

@@ -8,6 +8,7 @@
 #include <new>
 
 #include "linux/base/connection_limit.h"
+#include "linux/base/error_line.h"
 #include "linux/base/monotonic_clock.h"
 #include "linux/base/thread.h"
 #include "wire/service_path.h"
@@ -45,7 +46,7 @@ void NotificationServer::stop() noexcept {
   socket_.remove_file();
   stopping_.store(true, std::memory_order_release);
   ::eventfd_write(wake_.get(), 1);
-  ::pthread_join(thread_, nullptr);
+  if (!join_thread(thread_, end_of_patience())) print_error_line("the thread of the notification center does not end");
 }
 
 void NotificationServer::post(ByteBuffer frame) noexcept {

@@ -26,6 +26,7 @@ namespace quorvel::platform {
 namespace {
 
 constexpr rlim_t kMaximumDescriptors = 65536;
+constexpr rlim_t kFewestDescriptors = 24;
 
 // A file that took the number of a closed standard descriptor would receive what is meant for that.
 [[nodiscard]] bool fill_standard_descriptors() noexcept {
@@ -38,21 +39,31 @@ constexpr rlim_t kMaximumDescriptors = 65536;
   return true;
 }
 
-// A peer that goes away and a file that reaches its size limit are errors to be handled, not reasons to die.
+// A peer that goes away and a file that reaches its size limit are errors to be handled, not reasons to die, and the
+// end of the terminal that the daemon was started from is none of its business.
 void ignore_fatal_signals() noexcept {
   struct sigaction ignore = {};
   ignore.sa_handler = SIG_IGN;
   ::sigaction(SIGPIPE, &ignore, nullptr);
   ::sigaction(SIGXFSZ, &ignore, nullptr);
+  ::sigaction(SIGHUP, &ignore, nullptr);
 }
 
-void raise_descriptor_limit() noexcept {
+// Raises the limit on descriptors as far as it goes. False, and a line on standard error, where even that is too few to
+// serve a client and read a file for it.
+[[nodiscard]] bool has_enough_descriptors() noexcept {
   rlimit limit;
-  if (::getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+  if (::getrlimit(RLIMIT_NOFILE, &limit) != 0) return true;
   const rlim_t wanted = std::min(limit.rlim_max, kMaximumDescriptors);
-  if (limit.rlim_cur >= wanted) return;
-  limit.rlim_cur = wanted;
-  ::setrlimit(RLIMIT_NOFILE, &limit);
+  if (limit.rlim_cur < wanted) {
+    limit.rlim_cur = wanted;
+    ::setrlimit(RLIMIT_NOFILE, &limit);
+  }
+  if (limit.rlim_cur >= kFewestDescriptors) return true;
+  host::print_error_line("a limit of %llu descriptors is too low, %llu are needed",
+                         static_cast<unsigned long long>(limit.rlim_cur),
+                         static_cast<unsigned long long>(kFewestDescriptors));
+  return false;
 }
 
 // A large file or reply takes its memory back to the system with it. The allocator would otherwise learn from the first
@@ -76,6 +87,7 @@ void bound_idle_memory() noexcept {
 }  // namespace
 
 int start_process(std::string_view service_name) noexcept {
+  host::settle_passed_sockets();
   if (!fill_standard_descriptors()) {
     host::print_system_error("cannot open /dev/null");
     return EX_OSERR;
@@ -92,7 +104,7 @@ int start_process(std::string_view service_name) noexcept {
   }
   ignore_fatal_signals();
   ::umask(022);
-  raise_descriptor_limit();
+  if (!has_enough_descriptors()) return EX_OSERR;
   bound_idle_memory();
   if (!main_run_loop()->open()) {
     host::print_system_error("cannot make the run loop");

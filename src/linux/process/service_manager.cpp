@@ -13,6 +13,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <string_view>
+#include <utility>
 
 #include "linux/base/error_line.h"
 #include "platform/process.h"
@@ -40,29 +41,24 @@ constexpr int kMaximumPassedDescriptors = 1024;
   return ::getsockopt(descriptor, SOL_SOCKET, option, &value, &length) == 0 && value == expected;
 }
 
-// The first passed descriptor that clients can be accepted from, or -1.
-[[nodiscard]] int find_passed_socket() noexcept {
-  if (environment_number("LISTEN_PID") != ::getpid()) return -1;
-  const int count = std::clamp(environment_number("LISTEN_FDS"), 0, kMaximumPassedDescriptors);
-  for (int descriptor = kFirstPassedDescriptor; descriptor < kFirstPassedDescriptor + count; ++descriptor) {
-    if (has_socket_option(descriptor, SO_DOMAIN, AF_UNIX) && has_socket_option(descriptor, SO_TYPE, SOCK_STREAM) &&
-        has_socket_option(descriptor, SO_ACCEPTCONN, 1)) {
-      return descriptor;
-    }
-  }
-  return -1;
+[[nodiscard]] bool is_listening_socket(int descriptor) noexcept {
+  return has_socket_option(descriptor, SO_DOMAIN, AF_UNIX) && has_socket_option(descriptor, SO_TYPE, SOCK_STREAM) &&
+         has_socket_option(descriptor, SO_ACCEPTCONN, 1);
 }
+
+// The passed descriptor that clients are accepted from, or -1. Settled before the daemon opens anything of its own.
+constinit int passed_socket = -1;
 
 [[nodiscard]] bool send_to_manager(std::string_view socket_name, std::string_view message) noexcept {
   sockaddr_un address = {};
   address.sun_family = AF_UNIX;
-  if (socket_name.size() < 2 || socket_name.size() >= sizeof address.sun_path) {
+  // An abstract name starts with a zero byte and ends where the address does, without one.
+  const bool is_abstract = socket_name.starts_with('@');
+  if (socket_name.size() < 2 || socket_name.size() + (is_abstract ? 0 : 1) > sizeof address.sun_path) {
     errno = EINVAL;
     return false;
   }
   std::memcpy(address.sun_path, socket_name.data(), socket_name.size());
-  // An abstract name starts with a zero byte and ends where the address does.
-  const bool is_abstract = socket_name.front() == '@';
   if (is_abstract) address.sun_path[0] = '\0';
   const auto length =
       static_cast<socklen_t>(offsetof(sockaddr_un, sun_path) + socket_name.size() + (is_abstract ? 0 : 1));
@@ -87,10 +83,24 @@ void tell_manager(std::string_view message) noexcept {
 
 }  // namespace
 
-bool host::has_passed_socket() noexcept { return find_passed_socket() >= 0; }
+void host::settle_passed_sockets() noexcept {
+  if (environment_number("LISTEN_PID") != ::getpid()) return;
+  const int count = std::clamp(environment_number("LISTEN_FDS"), 0, kMaximumPassedDescriptors);
+  for (int descriptor = kFirstPassedDescriptor; descriptor < kFirstPassedDescriptor + count; ++descriptor) {
+    if (!is_listening_socket(descriptor)) continue;
+    passed_socket = descriptor;
+    return;
+  }
+  if (count > 0) {
+    print_error_line("none of the %d descriptors that were passed (LISTEN_FDS) is a listening local stream socket",
+                     count);
+  }
+}
+
+bool host::has_passed_socket() noexcept { return passed_socket >= 0; }
 
 Descriptor host::take_passed_socket() noexcept {
-  const int descriptor = find_passed_socket();
+  const int descriptor = std::exchange(passed_socket, -1);
   if (descriptor < 0) return Descriptor();
   ::fcntl(descriptor, F_SETFD, FD_CLOEXEC);
   const int flags = ::fcntl(descriptor, F_GETFL);

@@ -7,6 +7,10 @@
 
 namespace quorvel::platform::host {
 
+/// Finds out which sockets the service manager passed. To be called before anything is opened, whose number would
+/// otherwise be taken for one that was passed; says on standard error when none of them can be used. Main thread, once.
+void settle_passed_sockets() noexcept;
+
 /// True when the service manager passed a listening local stream socket. Main thread.
 [[nodiscard]] bool has_passed_socket() noexcept;
 
