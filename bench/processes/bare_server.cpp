@@ -13,7 +13,7 @@
 
 #include "bench/processes/local_socket.h"
 #include "bench/support/files.h"
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 
 namespace quorvel::bench {
 namespace {

@@ -8,7 +8,7 @@
 #include "bench/processes/service.h"
 #include "bench/support/files.h"
 #include "bench/support/scratch_root.h"
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 #include "protocol/quorvel_protocol.h"
 #include "wire/frame.h"
 #include "wire/service_path.h"

@@ -10,8 +10,9 @@
 namespace quorvel {
 namespace {
 
-PropertyValue copy_regulatory_images() noexcept {
-  PropertyValue images = load_dict(paths::kRegulatoryImages);
+// Most files are passed on as their bytes; of any other, the value is returned.
+PropertyValue copy_regulatory_images(CheckedBytes& bytes) noexcept {
+  PropertyValue images = load_dict_or_bytes(paths::kRegulatoryImages, bytes);
   if (images && !images.is_dictionary()) {
     daemon_log(0, protocol::kCopyRegulatoryImages.data(), "%s does not hold a dictionary", paths::kRegulatoryImages);
     images = nullptr;
@@ -42,8 +43,14 @@ bool QuorvelDaemon::accept(void* object, platform::IpcListener*, platform::IpcCo
 }
 
 void QuorvelDaemon::copyRegulatoryImagesWithCompletionBlock(platform::IpcReply reply) const noexcept {
-  const PropertyValue images = copy_regulatory_images();
-  if (reply) reply.send(images, nullptr);
+  CheckedBytes bytes;
+  const PropertyValue images = copy_regulatory_images(bytes);
+  if (!reply) return;
+  if (bytes) {
+    reply.send(bytes);
+  } else {
+    reply.send(images, nullptr);
+  }
 }
 
 }  // namespace quorvel

@@ -12,7 +12,6 @@
 #include "platform/flush_file.h"
 #include "platform/lock.h"
 #include "property/binary/binary.h"
-#include "property/binary/encoded.h"
 
 namespace quorvel {
 namespace {
@@ -73,7 +72,8 @@ int store(const char* path, const PropertyValue& value, const OmittedEntries& om
   return -1;
 }
 
-PropertyValue read_value(const Descriptor& file, const char* path, std::size_t size, Mutability mutability) noexcept {
+PropertyValue read_value(const Descriptor& file, const char* path, std::size_t size, Mutability mutability,
+                         CheckedBytes* checked) noexcept {
   ByteBuffer buffer;
   if (!buffer.resize(size)) {
     daemon_log(0, kLoad, "Could not allocate buffer");
@@ -84,23 +84,13 @@ PropertyValue read_value(const Descriptor& file, const char* path, std::size_t s
     daemon_log(0, kLoad, "Could not read %s: %s", path, error.text());
     return {};
   }
-  PropertyValue value =
-      mutability == Mutability::immutable ? read_encoded(std::move(buffer)) : read_binary(buffer.bytes(), mutability);
+  if (checked != nullptr && (*checked = CheckedBytes::check(buffer))) return {};
+  PropertyValue value = read_binary(buffer.bytes(), mutability);
   if (!value) daemon_log(0, kLoad, "Could not create dictionary from stream");
   return value;
 }
 
-}  // namespace
-
-int store_dict(const char* path, const PropertyValue& value) noexcept {
-  return store(path, value, {}, Durability::ordinary);
-}
-
-int store_dict_durably(const char* path, const PropertyValue& value, const OmittedEntries& omitted) noexcept {
-  return store(path, value, omitted, Durability::flushed);
-}
-
-PropertyValue _load_dict(const char* path, bool immutable) noexcept {
+PropertyValue load(const char* path, Mutability mutability, CheckedBytes* checked) noexcept {
   const Descriptor file(_safe_open(path, O_RDONLY, 0, kRegularFile));
   if (!file) {
     const ErrorText error;
@@ -120,13 +110,28 @@ PropertyValue _load_dict(const char* path, bool immutable) noexcept {
     return {};
   }
   const auto size = static_cast<std::size_t>(status.st_size);
-  const Mutability mutability = immutable ? Mutability::immutable : Mutability::mutable_containers;
-  if (status.st_size <= kLargeFile) return read_value(file, path, size, mutability);
+  if (status.st_size <= kLargeFile) return read_value(file, path, size, mutability, checked);
   const LockHold one_at_a_time(large_load_lock);
-  return read_value(file, path, size, mutability);
+  return read_value(file, path, size, mutability, checked);
 }
 
+}  // namespace
+
+int store_dict(const char* path, const PropertyValue& value) noexcept {
+  return store(path, value, {}, Durability::ordinary);
+}
+
+int store_dict_durably(const char* path, const PropertyValue& value, const OmittedEntries& omitted) noexcept {
+  return store(path, value, omitted, Durability::flushed);
+}
+
+PropertyValue _load_dict(const char* path, bool immutable) noexcept {
+  return load(path, immutable ? Mutability::immutable : Mutability::mutable_containers, nullptr);
+}
 PropertyValue load_dict(const char* path) noexcept { return _load_dict(path, true); }
 PropertyValue load_mutable_dict(const char* path) noexcept { return _load_dict(path, false); }
+PropertyValue load_dict_or_bytes(const char* path, CheckedBytes& bytes) noexcept {
+  return load(path, Mutability::immutable, &bytes);
+}
 
 }  // namespace quorvel

@@ -1,6 +1,7 @@
 // Property-list files, read and written whole through the safe open. Any thread may call everything here.
 #pragma once
 
+#include "property/binary/checked_bytes.h"
 #include "property/binary/omitted_entries.h"
 
 namespace quorvel {
@@ -19,5 +20,8 @@ namespace quorvel {
 [[nodiscard]] PropertyValue _load_dict(const char* path, bool immutable) noexcept;
 [[nodiscard]] PropertyValue load_dict(const char* path) noexcept;
 [[nodiscard]] PropertyValue load_mutable_dict(const char* path) noexcept;
+/// `load_dict` for a caller that only passes a dictionary on: where the file's bytes can be passed on as they are,
+/// `bytes` takes them and there is no value.
+[[nodiscard]] PropertyValue load_dict_or_bytes(const char* path, CheckedBytes& bytes) noexcept;
 
 }  // namespace quorvel

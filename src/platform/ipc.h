@@ -8,6 +8,10 @@
 
 #include "property/value.h"
 
+namespace quorvel {
+class CheckedBytes;
+}
+
 namespace quorvel::platform {
 
 /// What went wrong with a call, as its client is told.
@@ -31,6 +35,8 @@ class IpcReply {
   /// Sends a value (or none) and an error (or null); further calls do nothing. A reply that memory does not suffice
   /// for closes the connection. On the thread that runs the operation.
   void send(const PropertyValue& value, const IpcError* error) noexcept;
+  /// The same for a value that is there as its checked bytes.
+  void send(const CheckedBytes& value) noexcept;
 
  private:
   IpcConnection* connection_;

@@ -1,11 +1,8 @@
 // Dictionaries: entries in a row, in the order they came, and above a handful of them an index with linear probing.
 // A removed entry leaves a gap in the row until the row is next moved.
 
-#include <algorithm>
-#include <chrono>
 #include <cstdlib>
 #include <cstring>
-#include <limits>
 #include <new>
 
 #include "property/dictionary_index.h"
@@ -16,14 +13,6 @@ namespace quorvel {
 namespace detail {
 
 namespace {
-
-constexpr std::size_t kMaximumEntries = std::size_t{1} << 31;
-
-std::uint64_t make_seed() noexcept {
-  const auto now = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
-  int local = 0;
-  return mix(now ^ reinterpret_cast<std::uintptr_t>(&local), reinterpret_cast<std::uintptr_t>(&make_seed) | 1);
-}
 
 // Gives the dictionary an index of `size` slots; the old one stays when memory runs out.
 bool rebuild_index(DictionaryNode& dictionary, std::uint32_t size) noexcept {
@@ -120,10 +109,8 @@ void clear_slot(DictionaryNode& dictionary, std::uint32_t at) noexcept {
 
 }  // namespace
 
-const std::uint64_t kHashSeed = make_seed();
-
 DictionaryNode* new_dictionary(std::size_t capacity, std::uint8_t flags) noexcept {
-  if (capacity > kMaximumEntries) return nullptr;
+  if (capacity > kMaximumSlots) return nullptr;
   void* memory = std::malloc(sizeof(DictionaryNode) + capacity * sizeof(Entry));
   if (memory == nullptr) return nullptr;
   auto* node = new (memory) DictionaryNode;
@@ -136,34 +123,6 @@ DictionaryNode* new_dictionary(std::size_t capacity, std::uint8_t flags) noexcep
   node->storage = node + 1;
   node->index = nullptr;
   return node;
-}
-
-ArrayNode* new_array(std::size_t capacity, std::uint8_t flags) noexcept {
-  if (capacity > kMaximumEntries) return nullptr;
-  void* memory = std::malloc(sizeof(ArrayNode) + capacity * sizeof(Word));
-  if (memory == nullptr) return nullptr;
-  auto* node = new (memory) ArrayNode;
-  node->count.store(1, std::memory_order_relaxed);
-  node->kind = PropertyKind::array;
-  node->flags = static_cast<std::uint8_t>(flags | kInlineStorage);
-  node->used = 0;
-  node->capacity = static_cast<std::uint32_t>(capacity);
-  node->storage = node + 1;
-  node->next = nullptr;
-  return node;
-}
-
-bool grow_storage(ContainerNode& container, std::size_t slot_size) noexcept {
-  const std::size_t capacity = std::max<std::size_t>(4, std::size_t{container.capacity} * 2);
-  if (capacity > kMaximumEntries) return false;
-  const bool is_inline = (container.flags & kInlineStorage) != 0;
-  void* grown = std::realloc(is_inline ? nullptr : container.storage, capacity * slot_size);
-  if (grown == nullptr) return false;
-  if (is_inline && container.used > 0) std::memcpy(grown, container.storage, container.used * slot_size);
-  container.storage = grown;
-  container.capacity = static_cast<std::uint32_t>(capacity);
-  container.flags = static_cast<std::uint8_t>(container.flags & ~kInlineStorage);
-  return true;
 }
 
 bool prepare_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept {
@@ -229,7 +188,6 @@ namespace {
 
 const PropertyValue kNone;
 
-// Of a value that accepts changes, which is never an encoded one.
 DictionaryNode& dictionary_of(Word word) noexcept { return *static_cast<DictionaryNode*>(node_of(word)); }
 
 }  // namespace

@@ -1,13 +1,8 @@
-// How a PropertyValue lies in memory. Private to the property room and its codec; everybody else includes value.h.
+// The nodes that values are made of. Private to this folder and the encoding; everybody else includes value.h.
+// docs/memory-layout.md draws them.
 //
-// A word is 0 (no value), an immediate (lowest bit set) or the address of a node, which is eight-byte aligned:
-//
-//   ...001  integer: the upper 61 bits, signed. Every integer that fits is held this way, so words compare.
-//   ...011  boolean: bit 3.
-//   ...000  Node*
-//
-// A leaf lies alone in one allocation and has a count of its own, or lies in a block with other leaves of the same
-// file and shares the block's count; a static text has none. Containers always have a count of their own.
+// A leaf lies alone in one allocation and has a count of its own, or lies in a block with other leaves of the same file
+// and shares the block's count; a static text has no count. Containers always have a count of their own.
 #pragma once
 
 #include <atomic>
@@ -16,6 +11,7 @@
 #include <string_view>
 
 #include "property/hash.h"
+#include "property/word.h"
 
 namespace quorvel {
 
@@ -28,24 +24,12 @@ namespace detail {
 /// Not constexpr: an expression that would call it at compile time does not compile, and the message names `why`.
 inline void refuse_to_compile(const char* why) noexcept { static_cast<void>(why); }
 
-using Word = std::uintptr_t;
-
-inline constexpr Word kImmediateBit = 1;
-inline constexpr Word kTagMask = 7;
-inline constexpr Word kIntegerTag = 1;
-inline constexpr Word kBooleanTag = 3;
-inline constexpr Word kFalse = kBooleanTag;
-inline constexpr Word kTrue = kBooleanTag | 8;
-inline constexpr std::int64_t kImmediateMaximum = (std::int64_t{1} << 60) - 1;
-inline constexpr std::int64_t kImmediateMinimum = -(std::int64_t{1} << 60);
-
 enum NodeFlag : std::uint8_t {
   kInBlock = 1,         // `count` is the distance to the block's head in eight-byte steps
   kStatic = 2,          // never counted, never freed
   kMutable = 4,         // accepts changes
   kVerbatim = 8,        // a leaf whose bytes stand in a file as they are: every one but a text with a byte above 0x7f
-  kEncoded = 16,        // a dictionary that is still its bytes: see encoded.cpp
-  kInlineStorage = 32,  // a container whose first slots lie in its own allocation
+  kInlineStorage = 16,  // a container whose first slots lie in its own allocation
 };
 
 struct Node {
@@ -115,7 +99,6 @@ struct DictionaryNode : ContainerNode {
   [[nodiscard]] Entry* entries() const noexcept { return static_cast<Entry*>(storage); }
 };
 
-[[nodiscard]] inline bool is_node(Word word) noexcept { return word != 0 && (word & kImmediateBit) == 0; }
 [[nodiscard]] inline Node* node_of(Word word) noexcept { return reinterpret_cast<Node*>(word); }
 [[nodiscard]] inline Block* block_of(const Node* node) noexcept {
   const std::size_t distance = node->count.load(std::memory_order_relaxed);
@@ -131,20 +114,8 @@ struct DictionaryNode : ContainerNode {
 }
 [[nodiscard]] inline std::string_view text_of(Word word) noexcept { return bytes_of(word)->view(); }
 [[nodiscard]] inline Word word_of(const Node* node) noexcept { return reinterpret_cast<Word>(node); }
-[[nodiscard]] inline Word immediate_integer(std::int64_t value) noexcept {
-  return (static_cast<Word>(value) << 3) | kIntegerTag;
-}
-[[nodiscard]] inline std::int64_t immediate_value(Word word) noexcept { return static_cast<std::int64_t>(word) >> 3; }
-
-/// The dictionary that an encoded one stands for; an empty one when memory runs out. And the end of an encoded one:
-/// returns what it stood for, whose reference the caller drops, or 0.
-[[nodiscard]] const DictionaryNode& open_encoded(const DictionaryNode& node) noexcept;
-[[nodiscard]] Word end_encoded(DictionaryNode& node) noexcept;
-
-/// The dictionary behind a word, with its entries.
 [[nodiscard]] inline const DictionaryNode& dictionary_at(Word word) noexcept {
-  const auto& node = *static_cast<const DictionaryNode*>(node_of(word));
-  return (node.flags & kEncoded) == 0 ? node : open_encoded(node);
+  return *static_cast<const DictionaryNode*>(node_of(word));
 }
 
 /// Frees a node whose last reference is gone, and what only it referred to, without recursion.
@@ -174,6 +145,14 @@ inline void release(Word word) noexcept {
 /// Retains a run of words, counting a run of leaves of one block at once.
 void retain_all(const Word* words, std::size_t count) noexcept;
 
+/// A leaf of its own memory, with one reference, whose bytes the caller fills in; null when memory runs out or the
+/// length reaches 4 GiB.
+[[nodiscard]] BytesNode* new_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept;
+/// Fills in the bytes of a number that no word holds, and returns its word; 0 for null.
+[[nodiscard]] Word finish_number(BytesNode* node, std::uint64_t bits) noexcept;
+
+/// The most slots of a container.
+inline constexpr std::size_t kMaximumSlots = std::size_t{1} << 31;
 /// An empty container with room for `capacity` slots in the same allocation, or null when memory runs out.
 [[nodiscard]] ArrayNode* new_array(std::size_t capacity, std::uint8_t flags) noexcept;
 [[nodiscard]] DictionaryNode* new_dictionary(std::size_t capacity, std::uint8_t flags) noexcept;

@@ -14,15 +14,8 @@ ContainerNode*& next_of(ContainerNode* container) noexcept {
   return static_cast<DictionaryNode*>(container)->next;
 }
 
-// Puts a container whose last reference is gone on the list; of an encoded one, what it stood for.
+// Puts a container whose last reference is gone on the list.
 void condemn(ContainerNode* container, ContainerNode*& condemned) noexcept {
-  if ((container->flags & kEncoded) != 0) {
-    const Word opened = end_encoded(*static_cast<DictionaryNode*>(container));
-    std::free(container);
-    // Nobody else could get hold of the dictionary behind it.
-    if (opened != 0) condemn(static_cast<ContainerNode*>(node_of(opened)), condemned);
-    return;
-  }
   if (container->kind == PropertyKind::dictionary) {
     std::free(static_cast<DictionaryNode*>(container)->order.load(std::memory_order_relaxed));
     std::free(static_cast<DictionaryNode*>(container)->index);

@@ -1,12 +1,10 @@
 #include "property/value.h"
 
 #include <bit>
-#include <cstdlib>
 #include <cstring>
 #include <limits>
-#include <new>
 
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 #include "property/unicode.h"
 
 namespace quorvel {
@@ -17,20 +15,8 @@ namespace {
 
 const PropertyValue kNone;
 
-BytesNode* new_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
-  if (length > std::numeric_limits<std::uint32_t>::max()) return nullptr;
-  void* memory = std::malloc(BytesNode::allocation(length));
-  if (memory == nullptr) return nullptr;
-  return new (memory) BytesNode{{1, kind, flags, 0}, static_cast<std::uint32_t>(length)};
-}
-
 PropertyValue new_number(PropertyKind kind, std::uint64_t bits, std::size_t length = 8) noexcept {
-  BytesNode* node = new_bytes(kind, length, kVerbatim);
-  if (node == nullptr) return nullptr;
-  auto* bytes = reinterpret_cast<std::byte*>(node->bytes());
-  std::memset(bytes, 0, length);
-  binary_format::put_integer(bytes + length - 8, bits, 8);
-  return PropertyValue::adopt(word_of(node));
+  return PropertyValue::adopt(finish_number(new_bytes(kind, length, kVerbatim), bits));
 }
 
 std::uint64_t bits_of(const BytesNode& number) noexcept {

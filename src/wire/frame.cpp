@@ -3,7 +3,6 @@
 #include <algorithm>
 
 #include "property/binary/binary.h"
-#include "property/binary/encoded.h"
 
 namespace quorvel::wire {
 
@@ -43,14 +42,26 @@ void write_big_endian(Number number, std::byte* bytes) noexcept {
   return std::all_of(name.begin(), name.end(), [](char c) { return c >= ' ' && c <= '~'; });
 }
 
-// A value that still has the bytes it came from travels as those.
-bool append_value(const PropertyValue& value, ByteBuffer& out) noexcept {
-  const auto bytes = encoded_bytes(value);
-  return bytes.empty() ? write_binary(value, out) : out.append(bytes.data(), bytes.size());
+[[nodiscard]] bool begin_frame(std::string_view name, ByteBuffer& out) noexcept {
+  constexpr std::byte empty_head[kFrameHeadSize] = {};
+  return name.size() <= kMaximumNameLength && is_printable(name) && out.append(empty_head, kFrameHeadSize) &&
+         out.append(name);
 }
 
-[[nodiscard]] bool append_body(std::string_view name, const PropertyValue& value, ByteBuffer& out) noexcept {
-  return out.append(name) && (!value || append_value(value, out));
+// Fills in the head of the frame that begins at `start`, or takes the frame back when it is not complete.
+[[nodiscard]] bool finish_frame(FrameKind kind, std::uint8_t flags, std::uint64_t serial, std::string_view name,
+                                std::size_t start, bool complete, ByteBuffer& out) noexcept {
+  if (!complete || out.size() - start - kFrameHeadSize > UINT32_MAX) {
+    static_cast<void>(out.resize(start));
+    return false;
+  }
+  std::byte* head = out.data() + start;
+  write_big_endian(static_cast<std::uint32_t>(out.size() - start - kFrameHeadSize), head);
+  head[4] = static_cast<std::byte>(kind);
+  head[5] = static_cast<std::byte>(flags);
+  write_big_endian(static_cast<std::uint16_t>(name.size()), head + 6);
+  set_frame_serial({head, kFrameHeadSize}, serial);
+  return true;
 }
 
 }  // namespace
@@ -68,23 +79,16 @@ FrameResult parse_frame(std::span<const std::byte> bytes, std::uint32_t maximum_
 
 bool append_frame(FrameKind kind, std::uint8_t flags, std::uint64_t serial, std::string_view name,
                   const PropertyValue& value, ByteBuffer& out) noexcept {
-  if (name.size() > kMaximumNameLength || !is_printable(name)) return false;
   const std::size_t start = out.size();
-  constexpr std::byte empty_head[kFrameHeadSize] = {};
-  if (!out.append(empty_head, kFrameHeadSize)) return false;
-  const bool appended = append_body(name, value, out);
-  const std::size_t body = out.size() - start - kFrameHeadSize;
-  if (!appended || body > UINT32_MAX) {
-    static_cast<void>(out.resize(start));
-    return false;
-  }
-  std::byte* head = out.data() + start;
-  write_big_endian(static_cast<std::uint32_t>(body), head);
-  head[4] = static_cast<std::byte>(kind);
-  head[5] = static_cast<std::byte>(flags);
-  write_big_endian(static_cast<std::uint16_t>(name.size()), head + 6);
-  set_frame_serial({head, kFrameHeadSize}, serial);
-  return true;
+  const bool complete = begin_frame(name, out) && (!value || write_binary(value, out));
+  return finish_frame(kind, flags, serial, name, start, complete, out);
+}
+
+bool append_frame(FrameKind kind, std::uint8_t flags, std::uint64_t serial, std::string_view name,
+                  const CheckedBytes& value, ByteBuffer& out) noexcept {
+  const std::size_t start = out.size();
+  const bool complete = begin_frame(name, out) && out.append(value.bytes().data(), value.bytes().size());
+  return finish_frame(kind, flags, serial, name, start, complete, out);
 }
 
 void set_frame_serial(std::span<std::byte> frame, std::uint64_t serial) noexcept {

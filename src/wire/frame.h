@@ -15,6 +15,7 @@
 #include <span>
 #include <string_view>
 
+#include "property/binary/checked_bytes.h"
 #include "property/byte_buffer.h"
 #include "property/value.h"
 
@@ -64,6 +65,9 @@ enum class FrameResult { complete, incomplete, refused };
 /// long or not printable ASCII, the value cannot be encoded, the body exceeds 4 GiB, or memory runs out. Any thread.
 [[nodiscard]] bool append_frame(FrameKind kind, std::uint8_t flags, std::uint64_t serial, std::string_view name,
                                 const PropertyValue& value, ByteBuffer& out) noexcept;
+/// The same around a value's checked bytes.
+[[nodiscard]] bool append_frame(FrameKind kind, std::uint8_t flags, std::uint64_t serial, std::string_view name,
+                                const CheckedBytes& value, ByteBuffer& out) noexcept;
 
 /// Writes another serial into a whole frame.
 void set_frame_serial(std::span<std::byte> frame, std::uint64_t serial) noexcept;

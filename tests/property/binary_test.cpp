@@ -2,7 +2,7 @@
 
 #include <cmath>
 
-#include "property/binary/encoded.h"
+#include "property/binary/checked_bytes.h"
 #include "property/limits.h"
 #include "support/values.h"
 
@@ -23,23 +23,22 @@ std::string bytes(std::string_view hex) {
   return result;
 }
 
-PropertyValue encoded_value(std::string_view file) {
-  ByteBuffer bytes;
-  EXPECT_TRUE(bytes.append(file));
-  return read_encoded(std::move(bytes));
+// What the reader and the check say of a file must agree.
+PropertyValue decoded(std::string_view file, Mutability mutability = Mutability::immutable) {
+  EXPECT_STREQ(check_fault(std::as_bytes(std::span(file))), nullptr);
+  return read_binary(std::as_bytes(std::span(file)), mutability);
 }
 
-// Both ways to read must agree on every file.
-PropertyValue decoded(std::string_view file, Mutability mutability = Mutability::immutable) {
-  PropertyValue value = read_binary(std::as_bytes(std::span(file)), mutability);
-  EXPECT_EQ(encoded_value(file), value);
-  return value;
+bool passes_check(std::string_view file) {
+  bool accepted = false;
+  EXPECT_STREQ(check_fault(std::as_bytes(std::span(file)), &accepted), nullptr);
+  return accepted;
 }
 
 // A file with one-byte widths around objects, the first of which is the top one.
-std::string file_of(std::initializer_list<std::string_view> objects) {
+std::string file_of(const std::vector<std::string>& objects) {
   std::string file = "bplist00", table;
-  for (const auto object : objects) {
+  for (const std::string& object : objects) {
     table += static_cast<char>(file.size());
     file += bytes(object);
   }
@@ -51,7 +50,7 @@ std::string file_of(std::initializer_list<std::string_view> objects) {
 
 // The object as the first value of a dictionary, far from the end of the file.
 std::string file_with(std::string_view object) {
-  return file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", object,
+  return file_of({"d2 01 02 03 04", "51 'a'", "51 'b'", std::string(object),
                   "4f 10 34 'What stands far from the end is read in another way.'"});
 }
 PropertyValue dictionary_with(const PropertyValue& value) {
@@ -61,7 +60,7 @@ PropertyValue dictionary_with(const PropertyValue& value) {
 TEST(Binary, WritesTheKnownBytes) {
   const struct {
     Value value;
-    std::string_view objects;
+    std::string objects;
   } cases[] = {
       {false, "08"},
       {true, "09"},
@@ -134,6 +133,10 @@ TEST(Binary, RefusesWhatIsNoPropertyList) {
       decoded(bytes("'bplist00' 0000000000000000 5f 10 0000000000 00 01 01 0000000000000001 0000000000000000"
                     "0000000000000011")))
       << "a size that stands in the offset table";
+  EXPECT_FALSE(
+      decoded(bytes("'bplist00' a1 01 09 08 08 0a 0b00000000 00 01 01 0000000000000003 0000000000000000"
+                    "000000000000000c")))
+      << "an offset that stands in the trailer";
   const std::string valid = file_of({"a2 01 02", "51 'a'", "10 05"});
   for (const int width : {0, 9, 255}) {
     for (const std::size_t at : {26u, 25u}) {
@@ -232,28 +235,30 @@ TEST(Binary, BoundsHoldForReaderAndWriterAlike) {
   EXPECT_EQ(read_binary(out.bytes(), Mutability::immutable), wide);
 }
 
-TEST(Binary, ADictionaryThatKeepsItsBytesBehavesLikeAnyOther) {
-  const PropertyValue expected = dictionary({{"a", array({1, "x"})}, {"b", dictionary({})}, {"c", 2.5}});
-  const std::string file = encoded(expected);
-  const PropertyValue value = encoded_value(file);
-  const PropertyValue copy = value;
-  const auto kept = encoded_bytes(copy);
-  EXPECT_EQ(std::string(reinterpret_cast<const char*>(kept.data()), kept.size()), file);
-  EXPECT_TRUE(encoded_bytes(expected).empty());
-  std::vector<std::thread> threads;
-  for (int i = 0; i < 4; ++i) {
-    threads.emplace_back([&] {
-      EXPECT_EQ(value.get("a").size(), 2u);
-      EXPECT_EQ(value, expected);
-      EXPECT_EQ(encoded(value), file);
-    });
+TEST(Binary, TheCheckAcceptsCommonLayouts) {
+  EXPECT_TRUE(passes_check(encoded(dictionary({{"a", array({1, "x"})}, {"b", dictionary({})}, {"c", 2.5}}))));
+  const std::vector<std::string> others[] = {
+      {"a0"},                                        // no dictionary
+      {"a1 01", "d0"},                               // nor here on top
+      {"d2 01 02 03 03", "51 'b'", "51 'a'", "09"},  // keys out of order
+      {"d1 01 02", "61 00e4", "09"},                 // or not ASCII
+      {"d2 01 02 03 03", "51 'a'", "51 'b'", "a0"},  // a shared container
+      {"d1 01 03", "51 'a'", "a0", "a1 02"},         // a container before its parent
+  };
+  for (const auto& objects : others) {
+    EXPECT_FALSE(passes_check(file_of(objects))) << objects[0];
+    EXPECT_TRUE(decoded(file_of(objects))) << objects[0];
   }
-  for (auto& thread : threads) thread.join();
-  EXPECT_FALSE(value.is_mutable());
-  PropertyValue open = value.mutable_copy();
-  ASSERT_TRUE(open.set("a", PropertyValue::boolean(true)));
-  EXPECT_EQ(value, expected);
-  EXPECT_TRUE(encoded_bytes(open).empty());
+  // Thirty levels that each refer twice to the next stand for a thousand million values.
+  std::vector<std::string> fan;
+  for (int level = 1; level <= 30; ++level) {
+    char object[32];
+    std::snprintf(object, sizeof object, "d2 1f 20 %02x %02x", level, level);
+    fan.emplace_back(object);
+  }
+  fan.insert(fan.end(), {"d0", "51 'a'", "51 'b'"});
+  EXPECT_FALSE(passes_check(file_of(fan)));
+  EXPECT_FALSE(decoded(file_of(fan)));
 }
 
 TEST(Binary, MutabilityIsThatOfTheRead) {

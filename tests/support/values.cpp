@@ -2,8 +2,10 @@
 
 #include <ostream>
 
+#include "property/binary/checked_bytes.h"
 #include "property/byte_buffer.h"
 #include "property/description.h"
+#include "property/unicode.h"
 
 namespace quorvel {
 namespace test {
@@ -60,6 +62,31 @@ const char* round_trip_fault(const PropertyValue& value) {
   return nullptr;
 }
 
+namespace {
+
+bool has_ascii_keys(const PropertyValue& value) {
+  for (std::size_t i = 0; value.kind() == PropertyKind::array && i < value.size(); ++i)
+    if (!has_ascii_keys(value.at(i))) return false;
+  for (const auto& [key, element] : value.entries())
+    if (!is_ascii(key.text()) || !has_ascii_keys(element)) return false;
+  return true;
+}
+
+}  // namespace
+
+const char* check_fault(std::span<const std::byte> file, bool* accepted) {
+  ByteBuffer bytes, written;
+  if (!bytes.append(file.data(), file.size())) return "no memory";
+  const PropertyValue value = read_binary(bytes.bytes(), Mutability::immutable);
+  const CheckedBytes checked = CheckedBytes::check(bytes);
+  if (accepted != nullptr) *accepted = static_cast<bool>(checked);
+  if (checked && !value.is_dictionary()) return "the check accepts bytes that hold no dictionary";
+  if (checked && !std::ranges::equal(checked.bytes(), file)) return "the check changes the bytes";
+  if (!checked && !std::ranges::equal(bytes.bytes(), file)) return "the check takes bytes that it refuses";
+  if (!value.is_dictionary() || !has_ascii_keys(value)) return nullptr;
+  if (!write_binary(value, written)) return "cannot be written";
+  return CheckedBytes::check(written) ? nullptr : "the check refuses what the writer writes";
+}
 const char* round_trip_fault(std::span<const std::byte> file, Mutability mutability) {
   const PropertyValue value = read_binary(file, mutability);
   return value ? round_trip_fault(value) : nullptr;

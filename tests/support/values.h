@@ -46,6 +46,10 @@ class Value {
 /// again and writing again. Returns what went wrong, or null.
 [[nodiscard]] const char* round_trip_fault(const PropertyValue& value);
 
+/// Takes `file` through the check of bytes that are passed on, and compares its answer with what the reader reads and
+/// the writer writes. Returns what went wrong, or null, and whether the check accepted the file.
+[[nodiscard]] const char* check_fault(std::span<const std::byte> file, bool* accepted = nullptr);
+
 /// Reads `file`, and takes what it holds, if anything, through the same.
 [[nodiscard]] const char* round_trip_fault(std::span<const std::byte> file, Mutability mutability);
 

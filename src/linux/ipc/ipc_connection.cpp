@@ -62,6 +62,11 @@ void IpcReply::send(const PropertyValue& value, const IpcError* error) noexcept 
   if (connection != nullptr) connection->reply(serial_, value, error);
 }
 
+void IpcReply::send(const CheckedBytes& value) noexcept {
+  IpcConnection* connection = std::exchange(connection_, nullptr);
+  if (connection != nullptr) connection->reply(serial_, value);
+}
+
 void set_exported_interface(IpcConnection* connection, const IpcInterface* interface) noexcept {
   connection->set_interface(interface);
 }
@@ -89,14 +94,22 @@ void IpcConnection::run_call(const wire::Frame& frame, host::IpcOutgoing& outgoi
 }
 
 void IpcConnection::reply(std::uint64_t serial, const PropertyValue& value, const IpcError* error) noexcept {
-  ByteBuffer& frame = outgoing_->frame;
-  frame.clear();
-  if (append_reply(serial, value, error, frame)) {
-    transmit(frame);
+  outgoing_->frame.clear();
+  finish_reply(append_reply(serial, value, error, outgoing_->frame));
+}
+
+void IpcConnection::reply(std::uint64_t serial, const CheckedBytes& value) noexcept {
+  outgoing_->frame.clear();
+  finish_reply(wire::append_frame(wire::FrameKind::reply, 0, serial, {}, value, outgoing_->frame));
+}
+
+void IpcConnection::finish_reply(bool complete) noexcept {
+  if (complete) {
+    transmit(outgoing_->frame);
   } else {
     broken_ = true;
   }
-  frame.clear(kKeptReplyRoom);
+  outgoing_->frame.clear(kKeptReplyRoom);
 }
 
 void IpcConnection::transmit(ByteBuffer& frame) noexcept {

@@ -52,6 +52,7 @@ class IpcConnection : public host::ListLink {
   void run_call(const wire::Frame& frame, host::IpcOutgoing& outgoing) noexcept;
   /// Sends a reply from within `run_call`.
   void reply(std::uint64_t serial, const PropertyValue& value, const IpcError* error) noexcept;
+  void reply(std::uint64_t serial, const CheckedBytes& value) noexcept;
   /// Sends more of the reply that waits.
   void continue_sending() noexcept;
   [[nodiscard]] bool has_waiting_reply() const noexcept { return static_cast<bool>(waiting_); }
@@ -67,6 +68,7 @@ class IpcConnection : public host::ListLink {
   ByteBuffer input;
 
  private:
+  void finish_reply(bool complete) noexcept;
   void transmit(ByteBuffer& frame) noexcept;
 
   Descriptor socket_;

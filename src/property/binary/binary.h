@@ -1,4 +1,4 @@
-// The binary property-list encoding, both ways. The format itself stands in binary_format.h.
+// The binary property-list encoding, both ways. The format itself stands in format.h.
 #pragma once
 
 #include <cstddef>

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstdlib>
-#include <limits>
 
 namespace quorvel::detail {
 
@@ -28,13 +27,6 @@ bool LeafAllocator::add_block(std::size_t size) noexcept {
   at_ = static_cast<char*>(memory) + sizeof(Block);
   end_ = static_cast<char*>(memory) + block_size_;
   return true;
-}
-
-BytesNode* LeafAllocator::add_large(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
-  if (length > std::numeric_limits<std::uint32_t>::max()) return nullptr;
-  void* memory = std::malloc(BytesNode::allocation(length));
-  if (memory == nullptr) return nullptr;
-  return new (memory) BytesNode{{1, kind, flags, 0}, static_cast<std::uint32_t>(length)};
 }
 
 }  // namespace quorvel::detail

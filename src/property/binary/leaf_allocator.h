@@ -39,7 +39,7 @@ class LeafAllocator {
   /// A leaf whose bytes the caller fills in, or null. A leaf of its own memory comes with one reference; a leaf in a
   /// block with none: it lives at least as long as this allocator.
   [[nodiscard]] BytesNode* add_bytes(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept {
-    if (length > kLargestShared) return add_large(kind, length, flags);
+    if (length > kLargestShared) return new_bytes(kind, length, flags);
     void* memory = take(BytesNode::allocation(length));
     if (memory == nullptr) return nullptr;
     return new (memory) BytesNode{{distance(memory), kind, static_cast<std::uint8_t>(flags | kInBlock), 0},
@@ -47,7 +47,6 @@ class LeafAllocator {
   }
 
  private:
-  [[nodiscard]] static BytesNode* add_large(PropertyKind kind, std::size_t length, std::uint8_t flags) noexcept;
   [[nodiscard]] void* take(std::size_t size) noexcept {
     size = (size + 7) & ~std::size_t{7};
     if (static_cast<std::size_t>(end_ - at_) < size && !add_block(size)) return nullptr;

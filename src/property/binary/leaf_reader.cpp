@@ -11,20 +11,15 @@ namespace format = binary_format;
 namespace {
 
 // A text in ASCII, or data.
-Word make_bytes(const EncodedObject& object, LeafAllocator& leaves) noexcept {
-  const bool is_text = object.kind == format::kAsciiText;
-  const std::string_view bytes(reinterpret_cast<const char*>(object.body), object.size);
-  if (is_text && !is_ascii(bytes)) return 0;
-  BytesNode* node = leaves.add_bytes(is_text ? PropertyKind::string : PropertyKind::data, bytes.size(), kVerbatim);
+Word make_bytes(const EncodedObject& object, PropertyKind kind, LeafAllocator& leaves) noexcept {
+  BytesNode* node = leaves.add_bytes(kind, object.size, kVerbatim);
   if (node == nullptr) return 0;
-  std::memcpy(node->bytes(), bytes.data(), bytes.size());
+  std::memcpy(node->bytes(), object.body, object.size);
   return word_of(node);
 }
 
-Word make_wide_text(const EncodedObject& object, LeafAllocator& leaves) noexcept {
-  const std::size_t length = utf8_length_of_utf16(object.body, object.size);
-  if (length == SIZE_MAX) return 0;
-  // A text that ASCII could have held is marked as what it is, so that it is written as such.
+Word make_wide_text(const EncodedObject& object, std::size_t length, LeafAllocator& leaves) noexcept {
+  // As many bytes as code units: every character is ASCII, and the text is written as such.
   const std::uint8_t flags = length == object.size ? kVerbatim : 0;
   BytesNode* node = leaves.add_bytes(PropertyKind::string, length, flags);
   if (node == nullptr) return 0;
@@ -33,17 +28,11 @@ Word make_wide_text(const EncodedObject& object, LeafAllocator& leaves) noexcept
 }
 
 Word make_number(PropertyKind kind, std::uint64_t bits, std::size_t length, LeafAllocator& leaves) noexcept {
-  BytesNode* node = leaves.add_bytes(kind, length, kVerbatim);
-  if (node == nullptr) return 0;
-  auto* bytes = reinterpret_cast<std::byte*>(node->bytes());
-  std::memset(bytes, 0, length);
-  format::put_integer(bytes + length - 8, bits, 8);
-  return word_of(node);
+  return finish_number(leaves.add_bytes(kind, length, kVerbatim), bits);
 }
 
 Word make_integer(const EncodedObject& object, LeafAllocator& leaves) noexcept {
   const bool is_wide = object.size == 16;
-  if (is_wide && !fits_64_bits(object)) return 0;
   const std::uint64_t value =
       is_wide ? format::get_integer(object.end - 8, 8) : format::get_integer(object.body, object.size);
   const bool is_large = is_wide && *object.body == std::byte{0} && value >> 63 != 0;
@@ -62,13 +51,13 @@ Word make_real(const EncodedObject& object, LeafAllocator& leaves) noexcept {
 
 }  // namespace
 
-Word make_leaf(const EncodedObject& object, LeafAllocator& leaves) noexcept {
+Word make_leaf(const EncodedObject& object, std::size_t length, LeafAllocator& leaves) noexcept {
   switch (object.kind) {
-    case format::kAsciiText:
-    case format::kData: return make_bytes(object, leaves);
+    case format::kAsciiText: return make_bytes(object, PropertyKind::string, leaves);
+    case format::kData: return make_bytes(object, PropertyKind::data, leaves);
     case format::kInteger: return make_integer(object, leaves);
     case format::kFalse >> 4: return object.nibble == (format::kTrue & 15) ? kTrue : kFalse;
-    case format::kUtf16Text: return make_wide_text(object, leaves);
+    case format::kUtf16Text: return make_wide_text(object, length, leaves);
     default: return make_real(object, leaves);
   }
 }

@@ -9,7 +9,8 @@
 #include <cstdint>
 #include <cstring>
 
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
+#include "property/binary/layout.h"
 #include "property/binary/short_text.h"
 #include "property/node.h"
 #include "property/unicode.h"
@@ -67,10 +68,16 @@ struct ShortHead {
   std::uint8_t size;  // how many of the bytes
 };
 
+/// A power of two, so that a head is found by a shift.
+inline constexpr std::size_t kHeadsOfAKind = std::bit_ceil(kShortText + 1);
+static_assert(kHeadsOfAKind > 16, "the widest number is a short leaf");
+static_assert(kShortText <= UINT8_MAX, "the length of a short leaf fits its head");
+static_assert(static_cast<std::size_t>(PropertyKind::data) < 8, "every kind of leaf has its heads");
+
 /// By kind and length.
 inline constexpr auto kShortHeads = [] {
   namespace format = binary_format;
-  std::array<std::array<ShortHead, 64>, 8> heads{};
+  std::array<std::array<ShortHead, kHeadsOfAKind>, 8> heads{};
   const auto set = [&](PropertyKind kind, std::size_t length, unsigned high, std::size_t low) {
     heads[static_cast<std::size_t>(kind)][length] = {
         {static_cast<std::uint8_t>(high << 4 | low), format::kInteger << 4, static_cast<std::uint8_t>(length)},
@@ -93,8 +100,14 @@ struct IntegerLeaf : BytesNode {
     length = 1U << width_exponent(bits);
     binary_format::put_integer(reinterpret_cast<std::byte*>(bytes()), bits << (64 - 8 * length), 8);
   }
-  char room[20];
+  char room[BytesNode::allocation(8) - BytesNode::kBytesOffset];
 };
+static_assert(sizeof(IntegerLeaf) >= BytesNode::allocation(8), "it can be read like any short leaf");
+
+// A short leaf is written in chunks, and its head whole, whatever they really take.
+static_assert(kLeafRoom >= kLongHead + std::max(kShortText, sizeof(Chunk)), "a short leaf stays within the room");
+static_assert(kLeafRoom >= sizeof(ShortHead));
+static_assert(kLeafRoom >= 2 + 8, "so does a marker with a size of eight bytes");
 
 inline std::byte* put_short_leaf(std::byte* at, const BytesNode& leaf) noexcept {
   const std::size_t length = leaf.length;
@@ -110,6 +123,24 @@ inline std::byte* put_wide_text(std::byte* at, const BytesNode& text) noexcept {
   return write_utf16(text.view(), put_marker(at, binary_format::kUtf16Text, utf16_units(text.view())));
 }
 
+/// Puts a leaf of any kind and size, step by step: the plain reference for `put_short_leaf`.
+inline std::byte* put_plain_leaf(std::byte* at, Word word) noexcept {
+  namespace format = binary_format;
+  const BytesNode& leaf = *bytes_of(word);
+  if ((leaf.flags & kVerbatim) == 0) return put_wide_text(at, leaf);
+  switch (leaf.kind) {
+    case PropertyKind::string: at = put_marker(at, format::kAsciiText, leaf.length); break;
+    case PropertyKind::data: at = put_marker(at, format::kData, leaf.length); break;
+    case PropertyKind::date: *at++ = std::byte{format::kDate}; break;
+    default: {
+      const unsigned kind = leaf.kind == PropertyKind::real ? format::kReal : format::kInteger;
+      *at++ = static_cast<std::byte>(kind << 4 | static_cast<unsigned>(std::countr_zero(leaf.length)));
+    }
+  }
+  if (leaf.length > 0) std::memcpy(at, leaf.bytes(), leaf.length);
+  return at + leaf.length;
+}
+
 /// Puts a leaf; there must be room for `leaf_room` bytes. Returns where it ends.
 inline std::byte* put_leaf(std::byte* at, Word word) noexcept {
   namespace format = binary_format;
@@ -118,12 +149,7 @@ inline std::byte* put_leaf(std::byte* at, Word word) noexcept {
     *at = static_cast<std::byte>(word == kTrue ? format::kTrue : format::kFalse);
     return at + 1;
   }
-  const BytesNode& leaf = *bytes_of(word);
-  if ((leaf.flags & kVerbatim) == 0) return put_wide_text(at, leaf);
-  if (is_short_leaf(leaf)) return put_short_leaf(at, leaf);
-  at = put_marker(at, leaf.kind == PropertyKind::data ? format::kData : format::kAsciiText, leaf.length);
-  std::memcpy(at, leaf.bytes(), leaf.length);
-  return at + leaf.length;
+  return is_short_leaf(*bytes_of(word)) ? put_short_leaf(at, *bytes_of(word)) : put_plain_leaf(at, word);
 }
 
 }  // namespace quorvel::detail

@@ -10,7 +10,7 @@
 #include <cstring>
 #include <string_view>
 
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 #include "property/node.h"
 
 namespace quorvel::detail {
@@ -21,12 +21,17 @@ inline constexpr std::size_t kShortText = 48;
 /// Sixteen bytes of a text.
 using Chunk [[gnu::vector_size(16)]] = std::uint64_t;
 
+static_assert(kShortText <= 3 * sizeof(Chunk), "three chunks cover every short text");
+static_assert(BytesNode::kBytesOffset + sizeof(Chunk) <= BytesNode::allocation(0),
+              "a chunk at the beginning of the shortest text can be read and written");
+static_assert(BytesNode::allocation(kShortText) + 7 <= UINT8_MAX, "a short text's room fits its field");
+
 /// Where the chunks lie that cover a short text together with the one at its beginning.
 struct ShortShape {
   std::uint8_t middle;
   std::uint8_t last;
   std::uint8_t beyond;  // bytes of the first chunk that are not the text's
-  std::uint8_t room;    // that its node takes in a block, in bytes
+  std::uint8_t room;    // bytes of its node in a block
 };
 
 /// By length.

@@ -4,7 +4,7 @@
 #include <cstdlib>
 #include <memory>
 
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 
 namespace quorvel::detail {
 

@@ -7,9 +7,17 @@
 #include <cstdint>
 #include <span>
 
-#include "property/binary/binary_format.h"
+#include "property/binary/format.h"
 
 namespace quorvel::detail {
+
+[[nodiscard]] constexpr bool is_container_kind(unsigned kind) noexcept {
+  return kind == binary_format::kArray || kind == binary_format::kDictionary;
+}
+
+/// The common form of a long size is an integer of one byte: the marker of the object, that of the integer, the byte.
+inline constexpr auto kOneByteInteger = static_cast<std::byte>(binary_format::kInteger << 4);
+inline constexpr std::uint8_t kLongHead = 3;
 
 /// One object, taken apart but not looked into.
 struct EncodedObject {
@@ -18,9 +26,7 @@ struct EncodedObject {
   std::uint64_t size;   // bytes of a number, elements of a text, data or container
   const std::byte* body;
   const std::byte* end;
-  [[nodiscard]] bool is_container() const noexcept {
-    return kind == binary_format::kArray || kind == binary_format::kDictionary;
-  }
+  [[nodiscard]] bool is_container() const noexcept { return is_container_kind(kind); }
 };
 
 /// What a marker says of its object; `unit` 0 for a marker that has no kind here.
@@ -113,10 +119,9 @@ inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object)
   object.kind = byte >> 4;
   object.nibble = byte & 15;
   object.size = marker.is_long ? static_cast<std::uint64_t>(at[2]) : marker.size;
-  object.body = at + (marker.is_long ? 3 : 1);
-  constexpr auto kOneByte = static_cast<std::byte>(binary_format::kInteger << 4);
-  if ((marker.is_long & (at[1] != kOneByte)) != 0 && !parse_long_size(object)) return false;
-  // A multiplication that would wrap is of a size that the room rules out first.
+  object.body = at + (marker.is_long ? kLongHead : 1);
+  if ((marker.is_long & (at[1] != kOneByteInteger)) != 0 && !parse_long_size(object)) return false;
+  // A size that would make the multiplication wrap exceeds the room, and is refused before it.
   const std::size_t unit = unit_sizes_[marker.unit];
   const std::ptrdiff_t room = table_ - object.body;
   if (unit == 0 || room < 0 || object.size > static_cast<std::uint64_t>(room)) return false;
@@ -124,8 +129,5 @@ inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object)
   object.end = object.body + object.size * unit;
   return true;
 }
-
-/// True when a number of 16 bytes is one of 64.
-[[nodiscard]] bool fits_64_bits(const EncodedObject& wide_integer) noexcept;
 
 }  // namespace quorvel::detail

@@ -1,4 +1,4 @@
-#include "property/binary/binary_layout.h"
+#include "property/binary/layout.h"
 
 namespace quorvel::detail {
 
@@ -25,9 +25,10 @@ bool BinaryLayout::parse(std::span<const std::byte> bytes) noexcept {
   return top_ < count_;
 }
 
-// The size in an integer object of any width, which `object.body` is behind the marker of a single byte's.
+// Reads a long size of any width. On entry `object.body` stands where it belongs behind an integer of one byte: three
+// bytes behind the object's marker.
 bool BinaryLayout::parse_long_size(EncodedObject& object) const noexcept {
-  const std::byte* at = object.body - 2;
+  const std::byte* at = object.body - (kLongHead - 1);
   if (at == table_) return false;
   const auto integer = static_cast<std::uint8_t>(*at++);
   if (integer >> 4 != format::kInteger || (integer & 15) > 3) return false;
@@ -36,12 +37,6 @@ bool BinaryLayout::parse_long_size(EncodedObject& object) const noexcept {
   object.size = format::get_integer(at, width);
   object.body = at + width;
   return object.size >> 63 == 0;
-}
-
-bool fits_64_bits(const EncodedObject& wide_integer) noexcept {
-  const std::uint64_t high = format::get_integer(wide_integer.body, 8);
-  const std::uint64_t low = format::get_integer(wide_integer.body + 8, 8);
-  return high == 0 || (high == UINT64_MAX && low >> 63 == 1);
 }
 
 }  // namespace quorvel::detail

@@ -8,9 +8,10 @@
 
 #include "property/binary/binary.h"
 #include "property/binary/leaf_reader.h"
-#include "property/binary/short_text.h"
+#include "property/binary/object_walk.h"
 #include "property/block_run.h"
 #include "property/dictionary_index.h"
+#include "property/growing_row.h"
 #include "property/walk.h"
 
 namespace quorvel {
@@ -19,17 +20,6 @@ namespace format = binary_format;
 using namespace detail;
 
 namespace {
-
-// What stands for a container that is not made yet, or being made. Never retained, never handed out.
-constexpr Word kUnmade = 5;
-constexpr Word kInTheMaking = 5 | 8;
-
-bool is_text(Word made) noexcept { return (made & (kImmediateBit | kTextTag)) == kTextTag; }
-bool has_own_count(Word made) noexcept { return (made & (kImmediateBit | kBlockTag)) == 0; }
-Word plain_word(Word made) noexcept {
-  const Word is_node = (made & kImmediateBit) - 1;
-  return made & ~(is_node & (kBlockTag | kTextTag));
-}
 
 using Object = EncodedObject;
 
@@ -43,6 +33,30 @@ class Reader {
 
   [[nodiscard]] PropertyValue read() noexcept;
 
+  // The sink of the first pass.
+  struct ShortRun {
+    LeafAllocator::Room room;
+    MadeWord* made;
+    [[nodiscard]] bool has_room() const noexcept { return room.end - room.at >= kShortLeafRoom; }
+    [[nodiscard]] Chunk take(std::uint64_t number, const ShortLeaf& leaf) noexcept {
+      Chunk all;
+      made[number] = make_short_leaf(leaf, room, all);
+      return all;
+    }
+  };
+  [[nodiscard]] ShortRun begin_run() const noexcept { return {leaves_.room(), made_}; }
+  void end_run(const ShortRun& run) noexcept { leaves_.fill(run.room); }
+  // All objects are compared before a leaf is made of one that stands out of order.
+  [[nodiscard]] bool accept_disorder() const noexcept { return !objects_overlap(); }
+  [[nodiscard]] bool add_leaf(std::uint64_t number, const Object& object, std::size_t length) noexcept {
+    made_[number] = MadeWord::of_leaf(make_leaf(object, length, leaves_));
+    return made_[number].bits != 0 && (!made_[number].has_own_count() || note_counted(number));
+  }
+  [[nodiscard]] bool add_container(std::uint64_t number, const Object&) noexcept {
+    made_[number] = MadeWord::unmade();
+    return note_counted(number);
+  }
+
  private:
   using Run = BlockRun<TakeReferences>;
   struct Frame {
@@ -50,28 +64,26 @@ class Reader {
     std::uint64_t next;  // reference to look at
   };
 
-  bool make_leaves() noexcept;
-  bool make_short_leaves(std::uint64_t& end) noexcept;
   bool objects_overlap() const noexcept;
   // Notes an object that has, or will have, a count of its own; releases it when memory runs out.
   bool note_counted(std::uint64_t number) noexcept;
   void release_made(std::uint64_t number) const noexcept {
-    if (has_own_count(made_[number])) release(plain_word(made_[number]));
+    if (made_[number].has_own_count()) release(made_[number].plain());
   }
 
   bool make_containers() noexcept;
   bool visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept;
-  bool make_container(const Object& object, Word& made) noexcept;
-  bool make_array(const Object& object, Word& made) noexcept;
-  bool make_dictionary(const Object& object, Word& made) noexcept;
+  bool make_container(const Object& object, MadeWord& made) noexcept;
+  bool make_array(const Object& object, MadeWord& made) noexcept;
+  bool make_dictionary(const Object& object, MadeWord& made) noexcept;
   void fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept;
-  // What is referred to at `at`, or 0.
-  [[nodiscard]] Word made_at(const std::byte* at) const noexcept {
+  // The word of the object that the reference at `at` names, or 0 when there is no such object.
+  [[nodiscard]] MadeWord made_at(const std::byte* at) const noexcept {
     const std::uint64_t index = layout_.reference_at(at);
-    return index < layout_.count() ? made_[index] : 0;
+    return index < layout_.count() ? made_[index] : MadeWord{};
   }
   // The word of an object, with a reference to it.
-  Word take(Word made, Run& run) noexcept;
+  Word take(MadeWord made, Run& run) noexcept;
   // Each container but the top one is made for its first reference: when there are more, a walk meets some again.
   [[nodiscard]] bool shares_containers() const noexcept { return container_references_ + 1 > containers_; }
 
@@ -79,28 +91,24 @@ class Reader {
   std::uint8_t container_flags_;
   BinaryLayout layout_;
   LeafAllocator leaves_;
-  Word* made_ = nullptr;  // by the objects' numbers
-  std::uint64_t made_count_ = 0;
-  std::uint64_t* counted_ = nullptr;  // the numbers of the objects that have counts of their own
-  std::size_t counted_count_ = 0;
-  std::size_t counted_room_ = 0;
+  MadeWord* made_ = nullptr;           // by the objects' numbers
+  GrowingRow<std::uint64_t> counted_;  // the numbers of the objects that have counts of their own
   std::uint64_t containers_ = 0;
   std::uint64_t container_references_ = 0;
 };
 
 Reader::~Reader() {
-  for (std::size_t i = 0; i < counted_count_; ++i) release_made(counted_[i]);
-  std::free(counted_);
+  for (std::size_t i = 0; i < counted_.size(); ++i) release_made(counted_[i]);
   std::free(made_);
 }
 
 PropertyValue Reader::read() noexcept {
   if (!layout_.parse(bytes_)) return nullptr;
-  made_ = static_cast<Word*>(std::malloc(layout_.count() * sizeof(Word)));
+  made_ = static_cast<MadeWord*>(std::malloc(layout_.count() * sizeof(MadeWord)));
   if (made_ == nullptr) return nullptr;
   leaves_.start(bytes_.size());
-  if (!make_leaves() || !make_containers()) return nullptr;
-  const Word top = plain_word(made_[layout_.top()]);
+  if (!walk_objects(layout_, *this) || !make_containers()) return nullptr;
+  const Word top = made_[layout_.top()].plain();
   retain(top);
   PropertyValue value = PropertyValue::adopt(top);
   if (shares_containers() && !is_within_limits(value)) return nullptr;
@@ -130,78 +138,19 @@ bool Reader::objects_overlap() const noexcept {
   return false;
 }
 
-// Makes short leaves, one behind the other from the first object on that has no word yet, as long as each stands behind
-// the one before; `end` is where the last object ended. False when a text is none.
-bool Reader::make_short_leaves(std::uint64_t& end) noexcept {
-  // Bytes that are written may be anything's, to the compiler: what it must not read again is copied.
-  const BinaryLayout layout = layout_;
-  LeafAllocator::Room room = leaves_.room();
-  Word* const made = made_;
-  const std::uint64_t limit = layout.limit_of(kLargestShortObject);
-  std::uint64_t behind = end, i = made_count_;
-  Word word = kUnmade;
-  for (; i < layout.count() && room.end - room.at >= kShortLeafRoom; ++i) {
-    const std::uint64_t offset = layout.offset_of(i);
-    if (offset < behind || offset >= limit) break;
-    ShortLeaf leaf;
-    if (!find_short_leaf(layout.at(offset), leaf)) break;
-    word = make_short_leaf(leaf, room);
-    if (word == 0) break;
-    made[i] = word;
-    behind = layout.offset_at(leaf.body + leaf.size);
-  }
-  leaves_.fill(room);
-  made_count_ = i;
-  end = behind;
-  return word != 0;
-}
-
 bool Reader::note_counted(std::uint64_t number) noexcept {
-  if (counted_count_ == counted_room_) {
-    const std::size_t larger = std::max<std::size_t>(16, counted_room_ * 2);
-    void* grown = std::realloc(counted_, larger * sizeof *counted_);
-    if (grown == nullptr) {
-      release_made(number);
-      return false;
-    }
-    counted_ = static_cast<std::uint64_t*>(grown);
-    counted_room_ = larger;
-  }
-  counted_[counted_count_++] = number;
-  return true;
+  if (counted_.add(number)) return true;
+  release_made(number);
+  return false;
 }
 
-bool Reader::make_leaves() noexcept {
-  bool may_overlap = true;  // until it is known that nothing does
-  std::uint64_t end = format::kHeader.size();
-  while (made_count_ < layout_.count()) {
-    if (!make_short_leaves(end)) return false;
-    if (made_count_ == layout_.count()) return true;
-    Object object;
-    const std::uint64_t offset = layout_.offset_of(made_count_);
-    if (!layout_.object_at(offset, object)) return false;
-    // Objects that stand in the order of their numbers are compared one by one; the first that does not has all of
-    // them compared, before a leaf is made of it.
-    if (may_overlap && offset < end) {
-      if (objects_overlap()) return false;
-      may_overlap = false;
-    }
-    end = layout_.offset_at(object.end);
-    const Word made = object.is_container() ? kUnmade : tagged_leaf(make_leaf(object, leaves_));
-    if (made == 0) return false;
-    made_[made_count_++] = made;
-    if ((object.is_container() || has_own_count(made)) && !note_counted(made_count_ - 1)) return false;
-  }
-  return true;
-}
-
-inline Word Reader::take(Word made, Run& run) noexcept {
-  const Word word = plain_word(made);
-  if (has_own_count(made)) {
+inline Word Reader::take(MadeWord made, Run& run) noexcept {
+  const Word word = made.plain();
+  if (made.has_own_count()) {
     container_references_ += node_of(word)->kind >= PropertyKind::array ? 1 : 0;
     retain(word);
   } else {
-    run.add_masked(node_of(word), (made & kImmediateBit) - 1);
+    run.add_masked(node_of(word), made.node_mask());
   }
   return word;
 }
@@ -216,12 +165,12 @@ bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noex
   frame.next = std::max(frame.next, first);
   for (; frame.next < references; ++frame.next) {
     const std::byte* at = object.body + frame.next * layout_.reference_size();
-    const Word made = made_at(at);
-    if (made == 0 || made == kInTheMaking) return false;
-    if (made == kUnmade) {
+    const MadeWord made = made_at(at);
+    if (made.bits == 0 || made == MadeWord::in_the_making()) return false;
+    if (made == MadeWord::unmade()) {
       if (depth == kMaximumDepth) return false;
       stack[depth++] = {static_cast<std::size_t>(layout_.reference_at(at)), 0};
-      made_[stack[depth - 1].object] = kInTheMaking;
+      made_[stack[depth - 1].object] = MadeWord::in_the_making();
       return true;
     }
   }
@@ -230,42 +179,42 @@ bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noex
 }
 
 bool Reader::make_containers() noexcept {
-  if (made_[layout_.top()] != kUnmade) return true;
+  if (made_[layout_.top()] != MadeWord::unmade()) return true;
   Frame stack[kMaximumDepth];
   std::size_t depth = 1;
   stack[0] = {static_cast<std::size_t>(layout_.top()), 0};
-  made_[layout_.top()] = kInTheMaking;
+  made_[layout_.top()] = MadeWord::in_the_making();
   while (depth > 0) {
     if (!visit_children(stack[depth - 1], stack, depth)) return false;
   }
   return true;
 }
 
-bool Reader::make_container(const Object& object, Word& made) noexcept {
+bool Reader::make_container(const Object& object, MadeWord& made) noexcept {
   ++containers_;
   return object.kind == format::kDictionary ? make_dictionary(object, made) : make_array(object, made);
 }
 
-bool Reader::make_array(const Object& object, Word& made) noexcept {
+bool Reader::make_array(const Object& object, MadeWord& made) noexcept {
   ArrayNode* array = new_array(object.size, container_flags_);
   if (array == nullptr) return false;
-  made = word_of(array);
+  made = {word_of(array)};
   const std::byte* at = object.body;
   Run run;
   for (std::uint64_t i = 0; i < object.size; ++i, at += layout_.reference_size()) {
-    const Word item = made_at(at);
-    if (item == 0) return false;
+    const MadeWord item = made_at(at);
+    if (item.bits == 0) return false;
     array->items()[array->used++] = take(item, run);
   }
   return true;
 }
 
-bool Reader::make_dictionary(const Object& object, Word& made) noexcept {
+bool Reader::make_dictionary(const Object& object, MadeWord& made) noexcept {
   // Keys differ, and so do their objects.
   if (object.size > layout_.count()) return false;
   DictionaryNode* dictionary = new_dictionary(object.size, container_flags_);
   if (dictionary == nullptr) return false;
-  made = word_of(dictionary);
+  made = {word_of(dictionary)};
   if (!make_index(*dictionary, dictionary->capacity)) return false;
   fill_dictionary(object, *dictionary);
   return dictionary->used == dictionary->capacity;
@@ -274,7 +223,7 @@ bool Reader::make_dictionary(const Object& object, Word& made) noexcept {
 // Takes the entries in use, all of them or those up to the first that is not sound.
 void Reader::fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept {
   const BinaryLayout layout = layout_;
-  const Word* const made = made_;
+  const MadeWord* const made = made_;
   Entry* const entries = dictionary.entries();
   const std::byte* at = object.body;
   const std::byte* values = object.body + object.size * layout.reference_size();
@@ -285,9 +234,9 @@ void Reader::fill_dictionary(const Object& object, DictionaryNode& dictionary) n
   std::uint32_t i = 0;
   for (const std::uint32_t size = dictionary.capacity; i < size; ++i) {
     const std::uint64_t key_number = layout.reference_at(at), value_number = layout.reference_at(values);
-    if (key_number >= layout.count() || value_number >= layout.count() || !is_text(made[key_number])) break;
+    if (key_number >= layout.count() || value_number >= layout.count() || !made[key_number].is_text()) break;
     // Keys in ascending order are known to differ.
-    const std::string_view text = text_of(plain_word(made[key_number]));
+    const std::string_view text = text_of(made[key_number].plain());
     ascends = ascends && (i == 0 || stands_before(before, text));
     if (!ascends) dictionary.used = i;
     if (!index.add(text, !ascends)) break;
