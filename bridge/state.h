@@ -1,0 +1,24 @@
+// The telephony state that a modem makes. Pure functions.
+#pragma once
+
+#include <string>
+
+#include "bridge/reading.h"
+#include "property/value.h"
+
+namespace quorvel::bridge {
+
+/// Codes of the error pairs in domain 1, the bridge's own findings.
+enum Finding : int { kNoModem = 1, kCardLocked, kCardUnreadable, kModemStarting, kNotRunning, kBusLost };
+inline constexpr int kFindingDomain = 1;
+
+/// The SIM status of `modem`, empty when it has none to tell.
+[[nodiscard]] std::string sim_status(const Modem& modem);
+/// True for a status that says that a card is in the tray.
+[[nodiscard]] bool is_card_present(const std::string& status);
+
+/// The state of `modem`, or of no modem (null). `keeps_imsi`: the subscriber told last belongs to this card, or nobody
+/// can say. Null when memory runs out.
+[[nodiscard]] PropertyValue state_of(Reach reach, const Modem* modem, bool keeps_imsi);
+
+}  // namespace quorvel::bridge
