@@ -4,6 +4,8 @@
 declare -A packages=(
   # To configure and build everything, tests included.
   [build]="g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev"
+  # To build the bridge to ModemManager, and to test it on the real one.
+  [bridge]="libsystemd-dev modemmanager dbus-daemon"
   [clang]="clang"
   [lint]="clang clang-format clang-tidy shellcheck"
   [coverage]="clang llvm"

@@ -171,5 +171,56 @@ TEST_F(ModemManager, TheCardDecidesBetweenTwoModems) {
   expect("a card in the second", "ISP", kSecond);
 }
 
+// The daemon starts after everything was told, and collects all the same.
+TEST_F(ModemManager, ADaemonWithTheOldBasebandCollectsTheFacts) {
+  root.ignore_log();
+  start_manager();
+  expect("ready", "SP", kFirst);
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  const std::string head = "lookup_baseband_info_old: ";
+  for (const char* line : {"We now have SIM status", "Inserting ICCID into the data ark",
+                           "Inserting IMSI into the data ark", "Inserting baseband version into the data ark"}) {
+    EXPECT_TRUE(root.wait_for_log(head + line)) << line;
+  }
+  modem.insert("989453230000000020F2", "262029999999999");
+  modem.report_swap();
+  EXPECT_TRUE(root.wait_for_log(head + "The ICCID has changed") && root.wait_for_log(head + "The IMSI has changed"));
+  modem.eject();
+  modem.report_swap();
+  EXPECT_TRUE(root.wait_for_log(head + "The ICCID has been removed"));
+  EXPECT_TRUE(root.wait_for_log(head + "The IMSI has been removed"));
+  EXPECT_EQ(daemon.stop().status, 0);
+}
+
+TEST_F(ModemManager, ADaemonWithTheNewBasebandCollectsTheRadioInfo) {
+  root.ignore_log();
+  root.write_file("/sys/firmware/devicetree/base/baseband/class", std::string_view("\2\0\0\0", 4));
+  start_manager();
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  expect("ready", "SP", kFirst);
+  EXPECT_TRUE(root.wait_for_log("lookup_baseband_info_new: throwing some postponement into ark, radio status: Ready"));
+  EXPECT_TRUE(
+      root.wait_for_log("__lookup_baseband_info_new_block_invoke: got PhoneNumber = +4915112345678 from telvane"));
+  EXPECT_TRUE(plug("abstract:nobody"));
+  EXPECT_TRUE(root.wait_for_log("lookup_baseband_info_new: radio not ready: NotReady"));
+  EXPECT_EQ(daemon.stop().status, 0);
+}
+
+// Commands that change something are refused: the modem decides.
+TEST_F(ModemManager, IsShownButNotCommanded) {
+  for (const char* command : {"set", "fail", "notify"}) {
+    SocketPeer commander = SocketPeer::connected_to("telvane.sock");
+    commander.send(frame_bytes(wire::FrameKind::call, 1, command, dictionary({{"Field", "iccid"}})));
+    EXPECT_EQ(commander.receive()->kind, wire::FrameKind::state);
+    EXPECT_EQ(commander.receive()->value.get("Description").text(), "this telephony service follows a modem");
+  }
+  SocketPeer viewer = SocketPeer::connected_to("telvane.sock");
+  viewer.send(frame_bytes(wire::FrameKind::call, 1, "show"));
+  EXPECT_EQ(viewer.receive()->kind, wire::FrameKind::state);
+  EXPECT_EQ(viewer.receive()->kind, wire::FrameKind::reply);
+}
+
 }  // namespace
 }  // namespace quorvel::test
