@@ -24,6 +24,8 @@ inline constexpr char kInstanceLock[] = "/run/quorvel/quorveld.lock";
 
 // Written by packaging, the distribution and the administrator.
 inline constexpr char kDeviceInformation[] = "/etc/quorvel/device_information.plist";
+/// An empty file: this device has a telephony service.
+inline constexpr char kTelephonyMark[] = "/etc/quorvel/telephony";
 inline constexpr char kMachineInfo[] = "/etc/machine-info";
 inline constexpr char kMachineId[] = "/etc/machine-id";
 inline constexpr char kOsRelease[] = "/etc/os-release";

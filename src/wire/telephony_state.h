@@ -4,7 +4,9 @@
 // value and no error. Commands to the service are calls named below.
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
+#include <iterator>
 #include <string_view>
 
 #include "platform/telephony.h"
@@ -58,10 +60,8 @@ inline constexpr std::string_view kCatchUpEvents[] = {
 };
 
 [[nodiscard]] constexpr bool is_telephony_notification(std::string_view name) noexcept {
-  for (const std::string_view known : kTelephonyNotifications) {
-    if (known == name) return true;
-  }
-  return false;
+  return std::find(std::begin(kTelephonyNotifications), std::end(kTelephonyNotifications), name) !=
+         std::end(kTelephonyNotifications);
 }
 
 // Commands are calls on the service's socket, answered in turn: with the state (show), with the observers (notify),

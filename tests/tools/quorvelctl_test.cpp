@@ -80,6 +80,39 @@ TEST_F(Quorvelctl, ReadsTheSavedArkAsTheDaemonWould) {
   expect_calls({{{"ark", "list"}, 3, ""}});
 }
 
+TEST_F(Quorvelctl, ShowsTheFactsAndWhereTheyComeFrom) {
+  const char* const file = "/etc/quorvel/device_information.plist";
+  root.write_plist(file, dictionary({{"BatteryCurrentCapacity", 80},
+                                     {"SerialNumber", "x\033[2J"},
+                                     {"marketing-name", std::string(70, 'n')}}));
+  const std::string from = std::string(", ") + file + "\n";
+  const std::string battery = "com.Orvane.mobile.battery\n  BatteryCurrentCapacity  ";
+  const std::string indent(26, ' ');
+  expect_calls({
+      {{"facts", "BatteryCurrentCapacity"}, 0, battery + "80 percent\n" + indent + "integer" + from},
+      {{"facts", "SerialNumber", "BatteryCurrentCapacity", "MarketingName"},
+       0,
+       "Without a domain\n  SerialNumber            x\\x1b[2J\n" + indent + "text" + from +
+           "  MarketingName           " + std::string(70, 'n') + "\n" + indent + "text" + from + "\n" + battery +
+           "80 percent\n" + indent + "integer" + from},
+      {{"facts", "--json", "BatteryCurrentCapacity"},
+       0,
+       "[\n  {\n    \"domain\": \"com.Orvane.mobile.battery\",\n    \"key\": \"BatteryCurrentCapacity\",\n"
+       "    \"kind\": \"integer\",\n    \"origin\": \"" +
+           std::string(file) +
+           "\",\n    \"unit\": \"percent\",\n"
+           "    \"value\": 80\n  }\n]\n"},
+      {{"facts", "DiagData"}, 1, "com.Orvane.mobile.internal\n  DiagData  (no answer)\n"},
+      {{"facts", "Nonsense"}, 2, ""},
+      {{"facts", "--watch", "0"}, 2, ""},
+  });
+  Program watching(control_program(), {.arguments = {"facts", "--watch", "1", "BatteryCurrentCapacity"}, .input = {}});
+  ASSERT_TRUE(watching.wait_for_output("80 percent"));
+  root.write_plist(file, dictionary({{"BatteryCurrentCapacity", 79}}));
+  EXPECT_TRUE(watching.wait_for_output("Z  BatteryCurrentCapacity  79 percent\n"));
+  EXPECT_EQ(watching.stop().status, 0);
+}
+
 TEST_F(Quorvelctl, ChangesPreferencesWholeAndKeepsTheRest) {
   const std::string path = "/private/var/mobile/Library/Preferences/com.example.plist";
   root.remove("/private/var/mobile/Library");

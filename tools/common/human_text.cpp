@@ -123,8 +123,8 @@ std::optional<std::size_t> terminal_width() {
 }
 
 std::string shell_word(std::string_view word) {
-  constexpr std::string_view kPlain = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_-./:,+@%";
-  if (!word.empty() && word.find_first_not_of(kPlain) == std::string_view::npos) return std::string(word);
+  constexpr std::string_view kUnquoted = "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_-./:,+@%";
+  if (!word.empty() && word.find_first_not_of(kUnquoted) == std::string_view::npos) return std::string(word);
   std::string quoted = "'";
   for (const char byte : word) quoted.append(byte == '\'' ? "'\\''" : std::string(1, byte));
   return quoted + '\'';

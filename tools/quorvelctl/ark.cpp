@@ -8,6 +8,7 @@
 #include "files.h"
 #include "live_answer.h"
 #include "output.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "saved_ark.h"
 
@@ -28,8 +29,8 @@ struct ArkWords {
 PropertyValue read_ark() {
   if (std::optional<PropertyValue> ark = read_saved_ark()) return *ark;
   struct stat status {};
-  if (platform::file_status(kStateDirectory, &status) != 0) fail_on("look into", kStateDirectory);
-  note(std::string("nothing is saved in ") + kArkFile + ". " + kSavesOnce);
+  if (platform::file_status(paths::kStateDirectory, &status) != 0) fail_on("look into", paths::kStateDirectory);
+  note(std::string("nothing is saved in ") + paths::kDataFile + ". " + kSavesOnce);
   return PropertyValue::dictionary();
 }
 
@@ -90,7 +91,7 @@ int list_domains(const PropertyValue& ark, bool json) {
 }
 
 int list_entries(const ArkWords& words, bool json) {
-  if (words.all + words.domains + words.has_domain > 1) {
+  if ((words.all && words.domains) || (words.has_domain && (words.all || words.domains))) {
     throw Failure{kWrongWords, "--all, --domains and --domain do not go together; use one of them"};
   }
   const PropertyValue ark = read_ark();

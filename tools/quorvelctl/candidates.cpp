@@ -6,6 +6,7 @@
 
 #include "commands.h"
 #include "files.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "saved_ark.h"
 #include "store/live_answer_table.h"
@@ -14,7 +15,6 @@
 namespace quorvel::tools {
 namespace {
 
-constexpr const char* kPreferences = "/private/var/mobile/Library/Preferences";
 constexpr std::string_view kExtension = ".plist";
 constexpr const char* kOwnDomain = "com.Orvane.quorveld";
 constexpr const char* kSaved = "saved";
@@ -32,7 +32,7 @@ void add_once(std::vector<Candidate>& list, std::string_view text, const char* d
 
 std::vector<Candidate> preference_domains() {
   std::vector<Candidate> domains{{kOwnDomain, "the daemon's own"}};
-  const int descriptor = platform::open_file(kPreferences, O_RDONLY | O_DIRECTORY, 0);
+  const int descriptor = platform::open_file(paths::kPreferencesDirectory, O_RDONLY | O_DIRECTORY, 0);
   const std::unique_ptr<DIR, int (*)(DIR*)> directory(descriptor < 0 ? nullptr : ::fdopendir(descriptor), ::closedir);
   while (const dirent* entry = directory ? ::readdir(directory.get()) : nullptr) {
     const std::string_view name = entry->d_name;
@@ -47,7 +47,8 @@ std::vector<Candidate> preference_keys(const UnfinishedCall& call) {
   const std::string* domain = find(call, "DOMAIN");
   if (domain == nullptr) return keys;
   if (*domain == kOwnDomain) keys = {{"ExtLogging", "log more"}, {"MachineHack", "run as a fixed machine type"}};
-  const auto values = read_device_plist(std::string(kPreferences) + '/' + *domain + std::string(kExtension));
+  const auto values =
+      read_device_plist(std::string(paths::kPreferencesDirectory) + '/' + *domain + std::string(kExtension));
   if (!values) return keys;
   for (const auto [key, value] : values->entries()) add_once(keys, key.text(), "");
   return keys;

@@ -10,6 +10,7 @@ namespace {
 
 constexpr std::size_t kIndent = 2;
 constexpr std::size_t kGap = 2;
+constexpr std::size_t kLongestBeside = 24;
 
 std::string source_of(const LiveAnswer& fact) {
   const std::string kind(kind_name(fact.value.kind()));
@@ -22,22 +23,22 @@ std::string value_of(const LiveAnswer& fact) {
 }
 
 struct Columns {
-  std::size_t width, value, source;
+  std::size_t value, source;
+  bool one_line;  // sources stand beside values, but for values that are too long
 };
 
-// Sources stand in one column behind the longest value that leaves them their place.
+// Sources stand in one column behind the values, or all of them below.
 Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
   std::size_t key = 0, value = 0, source = 0;
   for (const LiveAnswer& fact : facts) {
+    const std::size_t columns = columns_of(value_of(fact));
     key = std::max(key, fact.row->key.size());
-    source = std::max(source, columns_of(source_of(fact)));
+    if (fact.value) source = std::max(source, columns_of(source_of(fact)));
+    if (columns <= kLongestBeside) value = std::max(value, columns);
   }
   const std::size_t start = kIndent + key + kGap;
-  for (const LiveAnswer& fact : facts) {
-    const std::size_t columns = columns_of(value_of(fact));
-    if (start + columns + kGap + source <= width) value = std::max(value, columns);
-  }
-  return {width, start, start + value + kGap};
+  const std::size_t source_start = start + value + kGap;
+  return {start, source_start, source_start + source <= width};
 }
 
 void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& text) {
@@ -53,10 +54,8 @@ void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& te
     return;
   }
   const std::string source = source_of(fact);
-  if (end + kGap <= columns.source) {
+  if (columns.one_line && end + kGap <= columns.source) {
     text.append(columns.source - end, ' ');
-  } else if (end + kGap + columns_of(source) <= columns.width) {
-    text.append(kGap, ' ');
   } else {
     text.append("\n").append(columns.value, ' ');
   }

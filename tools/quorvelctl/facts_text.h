@@ -11,8 +11,8 @@ namespace quorvel::tools {
 /// The name of a value's kind, as people say it.
 [[nodiscard]] std::string_view kind_name(PropertyKind kind);
 
-/// Facts by domain, keys and values in columns, each with its kind and origin, which go onto a line of their own where
-/// they do not fit into `width` columns.
+/// Facts by domain, keys and values in columns, each with its kind and origin: in a column too, or on lines of their
+/// own when that is wider than `width`.
 [[nodiscard]] std::string facts_text(const std::vector<LiveAnswer>& facts, std::size_t width);
 
 /// One fact as a dictionary: "key", "domain" if it has one, and if there is an answer "value", "kind", "unit",

@@ -1,9 +1,19 @@
 #include "live_answer.h"
 
 #include "platform/device_information.h"
+#include "platform/device_questions.h"
 #include "store/live_answers.h"
 
 namespace quorvel::tools {
+namespace {
+
+std::string_view unit_of(std::string_view name) {
+  const platform::DeviceQuestion* question = platform::find_device_question(name);
+  // An address shows by itself what it is.
+  return question == nullptr || question->unit == "address" ? std::string_view() : question->unit;
+}
+
+}  // namespace
 
 LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::string& key) {
   const larry_info* row =
@@ -11,6 +21,9 @@ LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::st
   return row == nullptr ? LiveAnswer() : live_answer(*row);
 }
 
-LiveAnswer live_answer(const larry_info& row) { return {&row, platform::copy_device_answer(row.question), "", ""}; }
+LiveAnswer live_answer(const larry_info& row) {
+  const platform::DeviceAnswer answer = platform::copy_device_answer_with_origin(row.question);
+  return {&row, answer.value, std::string(answer.origin.text()), unit_of(row.question)};
+}
 
 }  // namespace quorvel::tools

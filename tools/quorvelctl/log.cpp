@@ -9,6 +9,7 @@
 #include "files.h"
 #include "log_files.h"
 #include "output.h"
+#include "platform/device_paths.h"
 
 namespace quorvel::tools {
 namespace {
@@ -88,7 +89,8 @@ int print_log(const LogWords& words, bool json) {
   LogFiles files;
   if (!files.open()) {
     if (!words.follow) {
-      throw Failure{kUnreachable, std::string("there is no log at ") + kLogFile + ". " + how_to_start("quorveld")};
+      throw Failure{kUnreachable,
+                    std::string("there is no log at ") + paths::kLogFile + ". " + how_to_start("quorveld")};
     }
     note("there is no log yet; waiting for one");
   }

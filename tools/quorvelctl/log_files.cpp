@@ -10,6 +10,7 @@
 
 #include "common/failure.h"
 #include "files.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 
 namespace quorvel::tools {
@@ -43,7 +44,7 @@ std::string read_at(const Descriptor& file, off_t offset, std::size_t size) {
   do {
     count = ::pread(file.get(), bytes.data(), bytes.size(), offset);
   } while (count < 0 && errno == EINTR);
-  if (count < 0) fail_on("read", kLogFile);
+  if (count < 0) fail_on("read", paths::kLogFile);
   bytes.resize(static_cast<std::size_t>(count));
   return bytes;
 }
@@ -53,12 +54,12 @@ std::string read_at(const Descriptor& file, off_t offset, std::size_t size) {
 bool LogFiles::open() {
   // A rotation between the two opens would show one file twice or skip one.
   for (;;) {
-    Descriptor previous = open_log(kPreviousLogFile);
-    Descriptor newest = open_log(kLogFile);
-    const Descriptor again = open_log(kPreviousLogFile);
+    Descriptor previous = open_log(paths::kPreviousLogFile);
+    Descriptor newest = open_log(paths::kLogFile);
+    const Descriptor again = open_log(paths::kPreviousLogFile);
     if (static_cast<bool>(previous) != static_cast<bool>(again) || (previous && !same_file(previous, again))) continue;
+    following_ = previous ? std::move(newest) : Descriptor();
     current_ = {previous ? std::move(previous) : std::move(newest), 0, {}};
-    following_ = std::move(newest);
     return static_cast<bool>(current_.file);
   }
 }
@@ -101,11 +102,11 @@ void LogFiles::move_on() {
     following_ = Descriptor();
     return;
   }
-  Descriptor newest = open_log(kLogFile);
+  Descriptor newest = open_log(paths::kLogFile);
   if (!newest || same_file(newest, current_.file)) return;
   // After two rotations in a row the file in between is the previous generation by now. What was written to `current_`
   // before it was replaced is read first, on the next turn.
-  Descriptor previous = open_log(kPreviousLogFile);
+  Descriptor previous = open_log(paths::kPreviousLogFile);
   following_ = previous && !same_file(previous, current_.file) ? std::move(previous) : std::move(newest);
 }
 

@@ -7,9 +7,6 @@
 
 namespace quorvel::tools {
 
-inline constexpr const char* kLogFile = "/var/mobile/Library/Logs/quorveld.log";
-inline constexpr const char* kPreviousLogFile = "/var/mobile/Library/Logs/quorveld.log.1";
-
 class LogFiles {
  public:
   /// Opens both generations. False when there is no log at all; throws Failure when there is one that cannot be read.

@@ -82,5 +82,8 @@ int main(int count, char** words) {
   } catch (const std::bad_alloc&) {
     quorvel::tools::note("memory does not suffice");
     return quorvel::tools::kUnreachable;
+  } catch (const std::exception& failure) {
+    quorvel::tools::note(failure.what());
+    return quorvel::tools::kUnreachable;
   }
 }

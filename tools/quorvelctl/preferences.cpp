@@ -13,6 +13,7 @@
 #include "files.h"
 #include "output.h"
 #include "platform/descriptor.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "platform/flush_file.h"
 
@@ -21,7 +22,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-constexpr const char* kDirectory = "/private/var/mobile/Library/Preferences";
+constexpr const char* kDirectory = paths::kPreferencesDirectory;
 constexpr std::size_t kLongestDomain = 200;
 constexpr auto kLockPatience = 10s;
 

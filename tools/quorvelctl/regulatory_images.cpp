@@ -2,16 +2,15 @@
 #include "commands.h"
 #include "files.h"
 #include "output.h"
+#include "platform/device_paths.h"
 
 namespace quorvel::tools {
 
 namespace {
 
-constexpr const char* kFile = "/private/var/mobile/Library/qvd/regulatory_images/regulatory_images.plist";
-
 // The reason as far as the caller can see it from outside.
 std::string why_none() {
-  const std::string path = kFile;
+  const std::string path = paths::kRegulatoryImages;
   try {
     const std::optional<PropertyValue> images = read_device_plist(path, Links::refused);
     if (!images) return "Provision them with: quorvelctl plist write " + ordinary_path(path);

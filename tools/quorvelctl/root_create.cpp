@@ -49,6 +49,13 @@ Descriptor make_path(int root, const std::string& path, mode_t mode) {
   return directory;
 }
 
+[[noreturn]] void refuse_root(const std::string& path, const std::string& part, const std::string& what) {
+  std::string message = path;
+  message.append("/").append(part).append(" is ").append(what);
+  message.append(", so this is no device root. Choose an empty directory");
+  throw Failure{kUnreachable, std::move(message)};
+}
+
 // Whether /var of the root is the link that the log's path runs through; nothing stands there yet otherwise.
 bool has_var_link(int root, const std::string& path) {
   struct stat status {};
@@ -57,8 +64,7 @@ bool has_var_link(int root, const std::string& path) {
   const ssize_t length = ::readlinkat(root, "var", target, sizeof target);
   const std::string_view found(target, static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
   if (found == kVarTarget || found == "/private/var") return true;
-  throw Failure{kUnreachable, path + "/var is there and no link to private/var, so " + path +
-                                  " is no device root. Choose an empty directory"};
+  refuse_root(path, "var", "no link to private/var");
 }
 
 // Refuses a directory in which something that is no directory stands where one is needed. Nothing is changed.
@@ -68,8 +74,7 @@ void check_path(int root, const std::string& path, const std::string& below) {
     struct stat status {};
     if (::fstatat(root, part.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return;
     if (!S_ISDIR(status.st_mode)) {
-      throw Failure{kUnreachable, path + '/' + part + " is no directory, so " + path +
-                                      " is no device root. Choose an empty directory"};
+      refuse_root(path, part, "no directory");
     }
     if (end == std::string::npos) return;
   }

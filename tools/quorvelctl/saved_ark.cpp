@@ -5,13 +5,14 @@
 
 #include "common/failure.h"
 #include "files.h"
+#include "platform/device_paths.h"
 
 namespace quorvel::tools {
 
 std::optional<PropertyValue> read_saved_ark() {
-  std::optional<PropertyValue> ark = read_device_plist(kArkFile, Links::refused);
+  std::optional<PropertyValue> ark = read_device_plist(paths::kDataFile, Links::refused);
   if (!ark || ark->is_dictionary()) return ark;
-  throw Failure{kUnreachable, std::string(kArkFile) + " is not a dictionary, so the daemon does not load it"};
+  throw Failure{kUnreachable, std::string(paths::kDataFile) + " is not a dictionary, so the daemon does not load it"};
 }
 
 std::vector<SavedEntry> saved_entries(const PropertyValue& ark) {

@@ -9,9 +9,6 @@
 
 namespace quorvel::tools {
 
-inline constexpr const char* kStateDirectory = "/private/var/mobile/Library/qvd";
-inline constexpr const char* kArkFile = "/private/var/mobile/Library/qvd/data_ark.plist";
-
 /// The saved dictionary, or nothing when no file is there: the daemon removes it when it has nothing to save. Throws
 /// Failure for a file that the daemon would not take.
 [[nodiscard]] std::optional<PropertyValue> read_saved_ark();

@@ -12,6 +12,7 @@
 #include "files.h"
 #include "log_files.h"
 #include "output.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "quorvel/client.h"
 #include "saved_ark.h"
@@ -24,7 +25,6 @@ using namespace std::chrono_literals;
 constexpr double kEpoch = 978'307'200;  // 2001, in seconds since 1970
 constexpr auto kPatience = 2s;
 constexpr std::size_t kLongestLine = 64u << 10;
-constexpr const char* kMark = "/etc/quorvel/telephony";
 constexpr const char* kSocket = "/run/quorvel/telvane.sock";
 
 std::string duration_text(double seconds) {
@@ -50,10 +50,12 @@ std::string why_not_followed(const Server& service, bool marked) {
     return exists(kSocket, &socket) ? std::string("nobody serves ") + kSocket + ", which is there"
                                     : std::string("nothing is at ") + kSocket + ": the service does not run";
   }
-  const bool foreign = service.state == Server::State::serving && exists("/run/quorvel", &directory) &&
+  const bool foreign = service.state == Server::State::serving && exists(paths::kServiceDirectory, &directory) &&
                        service.user != 0 && service.user != directory.st_uid;
   if (foreign) return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
-  if (!marked) return std::string("the daemon may have started without it: make ") + kMark + " and restart the daemon";
+  if (!marked)
+    return std::string("the daemon may have started without it: make ") + paths::kTelephonyMark +
+           " and restart the daemon";
   return is_installed_system() ? "the daemon says why with: journalctl -u quorveld"
                                : "the daemon says why on its standard error";
 }
@@ -105,11 +107,11 @@ Finding check_daemon(const Server& daemon) {
 Finding check_telephony(const Server& daemon) {
   Finding finding{"telephony", Verdict::well, {}, PropertyValue::dictionary()};
   struct stat status {};
-  const bool marked = exists(kMark, &status);
+  const bool marked = exists(paths::kTelephonyMark, &status);
   const bool expected = marked || exists(kSocket, &status);
   put(finding.facts, "expected", PropertyValue::boolean(expected));
   if (!expected) {
-    finding.lines.push_back(std::string("none on this device: there is no ") + kMark);
+    finding.lines.push_back(std::string("none on this device: there is no ") + paths::kTelephonyMark);
     return finding;
   }
   const Server service = server_of("telvane");
@@ -131,14 +133,14 @@ Finding check_telephony(const Server& daemon) {
 
 Finding check_ark() {
   Finding finding{"ark", Verdict::well, {}, PropertyValue::dictionary()};
-  put(finding.facts, "file", PropertyValue::string(kArkFile));
+  put(finding.facts, "file", PropertyValue::string(paths::kDataFile));
   try {
     struct stat status {};
     const std::optional<PropertyValue> ark = read_saved_ark();
     const std::int64_t count = ark ? static_cast<std::int64_t>(ark->size()) : 0;
     put(finding.facts, "entries", PropertyValue::integer(count));
-    if (!ark || !exists(kArkFile, &status)) {
-      finding.lines.push_back("nothing is saved; the daemon saves once, at its start");
+    if (!ark || !exists(paths::kDataFile, &status)) {
+      finding.lines.emplace_back("nothing is saved; the daemon saves once, at its start");
       return finding;
     }
     const double saved = static_cast<double>(status.st_mtim.tv_sec) - kEpoch;
@@ -153,8 +155,8 @@ Finding check_ark() {
 }
 
 Finding check_log() {
-  Finding finding{"log", Verdict::well, {kLogFile}, PropertyValue::dictionary()};
-  put(finding.facts, "file", PropertyValue::string(kLogFile));
+  Finding finding{"log", Verdict::well, {paths::kLogFile}, PropertyValue::dictionary()};
+  put(finding.facts, "file", PropertyValue::string(paths::kLogFile));
   try {
     LogFiles files;
     std::string tail;

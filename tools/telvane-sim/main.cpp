@@ -144,5 +144,8 @@ int main(int count, char** words) {
   } catch (const std::bad_alloc&) {
     std::fputs("telvane-sim: memory does not suffice\n", stderr);
     return quorvel::tools::kSystemError;
+  } catch (const std::exception& failure) {
+    std::fprintf(stderr, "telvane-sim: %s\n", failure.what());
+    return quorvel::tools::kSystemError;
   }
 }

@@ -15,6 +15,7 @@
 #include "linux/base/error_line.h"
 #include "linux/base/local_socket.h"
 #include "linux/telephony/telephony_trouble.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "wire/service_path.h"
 #include "wire/telephony_answers.h"
@@ -24,7 +25,6 @@ namespace quorvel::platform {
 namespace {
 
 // A device with this file has a telephony service, though perhaps not yet.
-constexpr char kTelephonyMark[] = "/etc/quorvel/telephony";
 
 // Pauses between attempts to reach a service that is there but does not answer, in milliseconds.
 constexpr int kFirstDelay = 100;
@@ -176,7 +176,7 @@ TelephonyCenter* existing_telephony_center() noexcept { return the_center; }
 TelephonyCenter* default_telephony_center() noexcept {
   if (asked_before) return the_center;
   asked_before = true;
-  if (!Descriptor(open_file(kTelephonyMark, O_PATH, 0)) && !host::TelephonyStream::has_place()) return nullptr;
+  if (!Descriptor(open_file(paths::kTelephonyMark, O_PATH, 0)) && !host::TelephonyStream::has_place()) return nullptr;
   the_center = new (std::nothrow) TelephonyCenter;
   if (the_center != nullptr && !the_center->start()) {
     delete the_center;
