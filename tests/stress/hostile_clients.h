@@ -27,7 +27,6 @@ class HostileClients {
 
   [[nodiscard]] std::size_t held() const { return held_.size(); }
   /// Ends one of those that stay connected: the first, or the last.
-  void drop_first() { held_.erase(held_.begin()); }
   void drop_last() { held_.pop_back(); }
   [[nodiscard]] long flood_replies() const { return flood_replies_; }
   [[nodiscard]] long reconnections() const { return reconnections_; }

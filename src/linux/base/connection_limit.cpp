@@ -13,10 +13,13 @@ namespace {
 constexpr rlim_t kReservedDescriptors = 32;
 constexpr std::size_t kObserverShare = 4;  // one in four
 
+// What each connection costs the kernel, an unread reply included, is memory of the device's.
+constexpr rlim_t kMaximumConnections = 4096;
+
 [[nodiscard]] std::size_t connection_limit() noexcept {
   rlimit limit;
   if (::getrlimit(RLIMIT_NOFILE, &limit) != 0 || limit.rlim_cur <= kReservedDescriptors) return 1;
-  return static_cast<std::size_t>(limit.rlim_cur - kReservedDescriptors);
+  return static_cast<std::size_t>(std::min(limit.rlim_cur - kReservedDescriptors, kMaximumConnections));
 }
 
 }  // namespace

@@ -6,7 +6,7 @@
 
 namespace quorvel::platform::host {
 
-/// Both follow the process's present limit on descriptors, and are at least 1. Any thread.
+/// Both follow the process's present limit on descriptors, are at least 1, and together at most 4,096. Any thread.
 [[nodiscard]] std::size_t client_connection_limit() noexcept;
 [[nodiscard]] std::size_t observer_connection_limit() noexcept;
 

@@ -6,6 +6,7 @@
 #include <span>
 
 #include "linux/base/intrusive_list.h"
+#include "linux/base/user_shares.h"
 #include "platform/descriptor.h"
 #include "platform/ipc.h"
 #include "property/byte_buffer.h"
@@ -16,8 +17,8 @@
 namespace quorvel::platform {
 
 namespace host {
-/// The longest body of a call.
-inline constexpr std::uint32_t kMaximumCallBody = 64u << 10;
+/// The longest body of a call: more than any operation has use for, and no more than what is read at once.
+inline constexpr std::uint32_t kMaximumCallBody = 16u << 10;
 
 /// What a connection borrows from its worker while a call of it runs.
 struct IpcOutgoing {
@@ -38,9 +39,11 @@ class IpcConnection : public host::ListLink {
     closed    // the end of the batch of events that it was closed in
   };
 
-  explicit IpcConnection(Descriptor socket) noexcept : socket_(std::move(socket)) {}
+  explicit IpcConnection(Descriptor socket) noexcept
+      : socket_(std::move(socket)), peer_(host::peer_of(socket_.get())) {}
 
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
+  [[nodiscard]] const host::Peer& peer() const noexcept { return peer_; }
   void close() noexcept { socket_ = Descriptor(); }
 
   void set_interface(const IpcInterface* interface) noexcept { interface_ = interface; }
@@ -66,12 +69,14 @@ class IpcConnection : public host::ListLink {
   std::uint32_t interest = 0;
   std::int64_t since = 0;
   ByteBuffer input;
+  std::size_t counted_input = 0;  // of `input`, what the listener has counted
 
  private:
   void finish_reply(bool complete) noexcept;
   void transmit(ByteBuffer& frame) noexcept;
 
   Descriptor socket_;
+  host::Peer peer_;
   const IpcInterface* interface_ = nullptr;
   void* object_ = nullptr;
   bool resumed_ = false;

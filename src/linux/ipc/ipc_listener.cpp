@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <new>
+#include <utility>
 
 #include "linux/base/error_line.h"
 #include "linux/base/thread.h"
@@ -88,6 +89,17 @@ host::IpcWorker& IpcListener::least_loaded() noexcept {
                            [](const host::IpcWorker& left, const host::IpcWorker& right) {
                              return left.connection_count() < right.connection_count();
                            });
+}
+
+void IpcListener::ask_others_for_room(const host::IpcWorker& worker) noexcept {
+  for (std::size_t i = 0; i < worker_count_; ++i) {
+    if (&workers_[i] != &worker) workers_[i].ask_for_room();
+  }
+}
+
+void IpcListener::count_input(IpcConnection& connection) noexcept {
+  const std::size_t before = std::exchange(connection.counted_input, connection.input.size());
+  held_input_.fetch_add(connection.counted_input - before, std::memory_order_relaxed);
 }
 
 IpcListener* create_listener(std::string_view service_name) noexcept {

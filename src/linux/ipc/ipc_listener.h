@@ -1,6 +1,7 @@
 // A listener of the IPC service with its socket and its workers.
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <string_view>
 
@@ -32,6 +33,12 @@ class IpcListener {
   [[nodiscard]] bool accepts(IpcConnection& connection) noexcept;
   [[nodiscard]] std::size_t connection_count() const noexcept;
   [[nodiscard]] host::IpcWorker& least_loaded() noexcept;
+  [[nodiscard]] host::UserShares& shares() noexcept { return shares_; }
+  /// Wakes the workers other than `worker` to make room: it has no connection of the user who holds most.
+  void ask_others_for_room(const host::IpcWorker& worker) noexcept;
+  /// The bytes that all connections together hold of calls that are not whole yet.
+  [[nodiscard]] std::size_t held_input() const noexcept { return held_input_.load(std::memory_order_relaxed); }
+  void count_input(IpcConnection& connection) noexcept;
 
  private:
   static constexpr std::size_t kMinimumWorkers = 2;
@@ -44,6 +51,8 @@ class IpcListener {
   IpcDelegate delegate_ = {};
   host::ListeningSocket socket_;
   wire::WaitingReplies waiting_replies_;
+  host::UserShares shares_;
+  std::atomic<std::size_t> held_input_ = 0;
   std::size_t worker_count_ = 0;  // settled before the first worker starts
   host::IpcWorker workers_[kMaximumWorkers];
 };

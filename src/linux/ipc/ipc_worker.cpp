@@ -28,6 +28,9 @@ constexpr std::int64_t kFinishMilliseconds = 100;
 // How long a thread stays awake for the next call of a client that called before.
 constexpr std::int64_t kAwakeMicroseconds = 50;
 
+// What connections may hold of calls that are not whole yet, all of them together.
+constexpr std::size_t kHeldInputBudget = 4u << 20;
+
 constexpr int kEventsAtOnce = 64;
 
 }  // namespace
@@ -135,6 +138,7 @@ void IpcWorker::handle(const epoll_event& event) noexcept {
     eventfd_t count;
     ::eventfd_read(wake_.get(), &count);
     take_in_handed_over();
+    if (must_make_room_.exchange(false)) make_room();
   } else {
     serve(*static_cast<IpcConnection*>(event.data.ptr));
   }
@@ -214,10 +218,26 @@ void IpcWorker::take_turn(IpcConnection& connection, std::span<const std::byte> 
     return set_interest(connection, EPOLLOUT);
   }
   settle(connection);
+  bound_held_input();
+}
+
+// Many clients that each begin a call would together hold more than the device can spare: beyond the budget, the oldest
+// unfinished calls of the user who holds most connections end, and where this worker has none, its oldest.
+void IpcWorker::bound_held_input() noexcept {
+  while (listener_->held_input() > kHeldInputBudget) {
+    const uid_t heaviest = listener_->shares().heaviest();
+    ConnectionList& partial = list_of(Stage::partial);
+    IpcConnection* oldest = partial.front();
+    while (oldest != nullptr && oldest->peer().user != heaviest) oldest = partial.after(oldest);
+    if (oldest == nullptr) oldest = partial.front();
+    if (oldest == nullptr) return;
+    close(*oldest);
+  }
 }
 
 // Finds out what a connection without a waiting reply waits for next.
 void IpcWorker::settle(IpcConnection& connection) noexcept {
+  listener_->count_input(connection);
   wire::Frame frame;
   const bool has_input = !connection.input.empty();
   if (has_input &&
@@ -268,6 +288,9 @@ void IpcWorker::set_interest(IpcConnection& connection, std::uint32_t events) no
 void IpcWorker::close(IpcConnection& connection) noexcept {
   if (connection.stage == Stage::closed) return;
   connection.close();
+  connection.input.clear(0);
+  listener_->count_input(connection);
+  listener_->shares().remove(connection.peer().user);
   move_to(connection, Stage::closed);
   count_.fetch_sub(1, std::memory_order_relaxed);
   // A descriptor is free again.

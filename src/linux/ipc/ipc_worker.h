@@ -40,6 +40,9 @@ class IpcWorker {
   /// its listener must then be left to it.
   [[nodiscard]] bool wait_for_end(const timespec& deadline) noexcept;
 
+  /// Has the worker close a connection of the user who holds most, if there are still too many. Any thread.
+  void ask_for_room() noexcept;
+
   /// How many connections belong to this worker. Any thread.
   [[nodiscard]] std::size_t connection_count() const noexcept { return count_.load(std::memory_order_relaxed); }
 
@@ -60,6 +63,7 @@ class IpcWorker {
   void receive(IpcConnection& connection) noexcept;
   void take_turn(IpcConnection& connection, std::span<const std::byte> bytes) noexcept;
   void settle(IpcConnection& connection) noexcept;
+  void bound_held_input() noexcept;
   void finish_reply(IpcConnection& connection) noexcept;
   void serve_ready() noexcept;
   void move_to(IpcConnection& connection, Stage stage) noexcept;
@@ -79,7 +83,8 @@ class IpcWorker {
   void accept_some() noexcept;
   [[nodiscard]] bool accept_one() noexcept;
   [[nodiscard]] bool introduce(Descriptor socket) noexcept;
-  [[nodiscard]] IpcConnection* longest_idle() const noexcept;
+  void make_room() noexcept;
+  [[nodiscard]] IpcConnection* first_to_give_way() noexcept;
   void hand_over(IpcConnection& connection) noexcept;
   void take_in(IpcConnection& connection) noexcept;
   void take_in_handed_over() noexcept;
@@ -92,6 +97,7 @@ class IpcWorker {
   pthread_t thread_ = {};
   bool started_ = false;
   std::atomic<bool> stopping_ = false;
+  std::atomic<bool> must_make_room_ = false;
   std::atomic<std::size_t> count_ = 0;
 
   // The thread's own.

@@ -14,9 +14,13 @@ namespace quorvel::platform::host {
 
 namespace {
 
-// A connection that was quiet for this long may have to make room for a new one; one that never made a call, sooner.
-constexpr std::int64_t kEvictableMilliseconds = 1000;
+// A connection without a call is given this long for its first one before it gives way to others.
 constexpr std::int64_t kUnusedMilliseconds = 100;
+
+// A user with more connections than this gets less room in the kernel for unread replies on the others: no program
+// needs so many, and each could leave a reply unread. The kernel doubles the number.
+constexpr std::size_t kOrdinaryConnections = 16;
+constexpr int kSmallSendRoom = 4096;
 
 constexpr int kAcceptsAtOnce = 16;
 
@@ -41,29 +45,25 @@ void IpcWorker::rest() noexcept {
   listen_again_ = now_ + kAcceptRestMilliseconds;
 }
 
-// Who connects only to leave again is often not alone: the next one is looked for without waiting for an event.
+// A client that connects only to leave again is often not alone: the next one is looked for without waiting for an
+// event.
 void IpcWorker::accept_some() noexcept {
   for (int i = 0; i < kAcceptsAtOnce && accept_one(); ++i) continue;
 }
 
-// Returns whether somebody came and is gone already.
+// Returns whether somebody came and is gone already. Everybody is let in, because only then it shows who they are; room
+// is made afterwards.
 bool IpcWorker::accept_one() noexcept {
-  IpcConnection* evicted = nullptr;
-  if (listener_->connection_count() >= client_connection_limit()) {
-    evicted = longest_idle();
-    if (evicted == nullptr) {
-      rest();
-      return false;
-    }
-  }
   Descriptor socket(::accept4(listener_->descriptor(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
   if (socket) {
-    if (evicted != nullptr) close(*evicted);
-    return introduce(std::move(socket));
-  } else if (is_exhaustion(errno)) {
-    evicted = longest_idle();
+    const bool is_gone = introduce(std::move(socket));
+    make_room();
+    return is_gone;
+  }
+  if (is_exhaustion(errno)) {
+    IpcConnection* first = first_to_give_way();
     rest();
-    if (evicted != nullptr) close(*evicted);
+    if (first != nullptr) close(*first);
   } else if (errno != EAGAIN && errno != EINTR && errno != ECONNABORTED) {
     rest();
   }
@@ -73,13 +73,19 @@ bool IpcWorker::accept_one() noexcept {
 // Returns whether the client is gone already.
 bool IpcWorker::introduce(Descriptor socket) noexcept {
   auto* connection = new (std::nothrow) IpcConnection(std::move(socket));
-  if (connection == nullptr) {
+  const std::size_t connections = connection != nullptr ? listener_->shares().add(connection->peer().user) : 0;
+  if (connections == 0) {
+    delete connection;
     rest();
     return false;
   }
   if (!listener_->accepts(*connection)) {
+    listener_->shares().remove(connection->peer().user);
     delete connection;
     return true;
+  }
+  if (connections > kOrdinaryConnections) {
+    ::setsockopt(connection->descriptor(), SOL_SOCKET, SO_SNDBUF, &kSmallSendRoom, sizeof kSmallSendRoom);
   }
   IpcWorker& least_loaded = listener_->least_loaded();
   // The kernel wakes the same thread again and again while that has time to accept, so the balance is struck here.
@@ -89,19 +95,42 @@ bool IpcWorker::introduce(Descriptor socket) noexcept {
   }
   count_.fetch_add(1, std::memory_order_relaxed);
   move_to(*connection, Stage::fresh);
-  // Who sends a call and leaves, or sends what is none, costs no more than that.
+  // A client that sends a call and leaves, or sends something that is no call, costs no more than that.
   receive(*connection);
   if (connection->interest == 0 && connection->stage != Stage::closed) set_interest(*connection, EPOLLIN);
   return connection->stage == Stage::closed;
 }
 
-// The least recently used connection that nothing is in flight on, one without a call first, or null when none has been
-// quiet long enough.
-IpcConnection* IpcWorker::longest_idle() const noexcept {
-  for (const auto& [stage, limit] :
-       {std::pair(Stage::fresh, kUnusedMilliseconds), std::pair(Stage::idle, kEvictableMilliseconds)}) {
-    IpcConnection* first = list_of(stage).front();
-    if (first != nullptr && first->since + limit <= now_) return first;
+void IpcWorker::ask_for_room() noexcept {
+  must_make_room_.store(true);
+  ::eventfd_write(wake_.get(), 1);
+}
+
+// Closes a connection when there are more than there may be.
+void IpcWorker::make_room() noexcept {
+  if (listener_->connection_count() <= client_connection_limit()) return;
+  if (IpcConnection* first = first_to_give_way()) {
+    close(*first);
+  } else {
+    listener_->ask_others_for_room(*this);
+  }
+}
+
+// Of the user who holds most connections, the one that is missed least: one that has been there for a while without a
+// call, then the one that has been idle longest, then one in the middle of a call or a reply, and one that has just
+// come last. Null when this worker has none of that user.
+IpcConnection* IpcWorker::first_to_give_way() noexcept {
+  const uid_t heaviest = listener_->shares().heaviest();
+  const auto oldest = [&](Stage stage, std::int64_t since) -> IpcConnection* {
+    ConnectionList& list = list_of(stage);
+    for (IpcConnection* connection = list.front(); connection != nullptr; connection = list.after(connection)) {
+      if (connection->peer().user == heaviest) return connection->since <= since ? connection : nullptr;
+    }
+    return nullptr;
+  };
+  if (IpcConnection* unused = oldest(Stage::fresh, now_ - kUnusedMilliseconds)) return unused;
+  for (const Stage stage : {Stage::idle, Stage::partial, Stage::sending, Stage::fresh}) {
+    if (IpcConnection* connection = oldest(stage, now_)) return connection;
   }
   return nullptr;
 }

@@ -7,7 +7,7 @@
 namespace quorvel::platform::host {
 
 NotificationObserver::NotificationObserver(Descriptor socket, std::uint64_t position) noexcept
-    : socket_(std::move(socket)), position_(position) {
+    : socket_(std::move(socket)), user_(peer_of(socket_.get()).user), position_(position) {
   tell(wire::FrameKind::ready, position, nullptr);
 }
 

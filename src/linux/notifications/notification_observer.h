@@ -5,6 +5,7 @@
 #include <cstdint>
 
 #include "linux/base/intrusive_list.h"
+#include "linux/base/user_shares.h"
 #include "platform/descriptor.h"
 #include "wire/frame.h"
 #include "wire/notification_ring.h"
@@ -20,6 +21,7 @@ class NotificationObserver : public ListLink {
   NotificationObserver(Descriptor socket, std::uint64_t position) noexcept;
 
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
+  [[nodiscard]] uid_t user() const noexcept { return user_; }
   /// The newest notification that the observer has been given or has missed.
   [[nodiscard]] std::uint64_t position() const noexcept { return position_; }
 
@@ -35,6 +37,7 @@ class NotificationObserver : public ListLink {
   [[nodiscard]] Progress send_current() noexcept;
 
   Descriptor socket_;
+  uid_t user_;
   std::uint64_t position_;
   wire::SharedBytes current_;  // the frame that is being sent
   std::size_t sent_ = 0;       // how much of it is

@@ -111,6 +111,7 @@ void NotificationServer::serve(NotificationObserver& observer) noexcept {
 }
 
 void NotificationServer::remove(NotificationObserver& observer) noexcept {
+  shares_.remove(observer.user());
   delete &observer;
   --observer_count_;
   // A descriptor is free again.
@@ -129,18 +130,34 @@ void NotificationServer::forget_served() noexcept {
 
 void NotificationServer::accept_all() noexcept {
   for (;;) {
-    if (observer_count_ >= observer_connection_limit()) return rest();
     Descriptor socket(::accept4(socket_.get(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
     if (!socket && (errno == EINTR || errno == ECONNABORTED)) continue;
     if (!socket && errno == EAGAIN) return;
     if (!socket || !take_in(std::move(socket))) return rest();
+    if (observer_count_ > observer_connection_limit()) make_room();
   }
+}
+
+// Of the user who has most observers, the newest gives way: those that have listened for long miss nothing.
+void NotificationServer::make_room() noexcept {
+  const uid_t heaviest = shares_.heaviest();
+  NotificationObserver* newest = nullptr;
+  for (NotificationObserver* observer = observers_.front(); observer != nullptr;
+       observer = observers_.after(observer)) {
+    if (observer->user() == heaviest) newest = observer;
+  }
+  if (newest != nullptr) remove(*newest);
 }
 
 bool NotificationServer::take_in(Descriptor socket) noexcept {
   auto* observer = new (std::nothrow) NotificationObserver(std::move(socket), served_);
   if (observer == nullptr) return false;
+  if (shares_.add(observer->user()) == 0) {
+    delete observer;
+    return false;
+  }
   if (!watch(observer->descriptor(), 0, observer, EPOLL_CTL_ADD)) {
+    shares_.remove(observer->user());
     delete observer;
     return false;
   }

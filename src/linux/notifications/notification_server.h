@@ -45,6 +45,7 @@ class NotificationServer {
   void forget_served() noexcept;
   void accept_all() noexcept;
   [[nodiscard]] bool take_in(Descriptor socket) noexcept;
+  void make_room() noexcept;
   void listen() noexcept;
   void rest() noexcept;
 
@@ -60,6 +61,7 @@ class NotificationServer {
   // The thread's own.
   IntrusiveList<NotificationObserver> observers_;
   std::size_t observer_count_ = 0;
+  UserShares shares_;
   std::uint64_t served_ = 0;       // what was newest when observers were last accepted
   std::int64_t listen_again_ = 0;  // when a resting listener is listened to again; 0 while it is listened to
 };
