@@ -6,8 +6,8 @@ if(NOT PLAN)
   set(PLAN ${TREE}/docs/architecture.md)
 endif()
 set(linux_headers "^(linux/|asm/|sys/(epoll|eventfd|signalfd|timerfd|inotify|fanotify|pidfd|prctl|sendfile|syscall)\\.h)")
-set(linux_folders "^(src/linux|client|telephony-service|bridge|tools)(/|$)")
-set(include_roots src . client/include tools)  # beside the including file's own folder
+set(linux_folders "^(src/linux|client|capi|telephony-service|bridge|tools)(/|$)")
+set(include_roots src . client/include capi/include tools)  # beside the including file's own folder
 
 # Sets `folders` to the table's first column, and `may_include_<folder>` for each.
 function(read_plan)
@@ -79,9 +79,10 @@ endfunction()
 
 file(REAL_PATH ${TREE} real_tree)
 read_plan()
-file(GLOB_RECURSE files RELATIVE ${TREE} ${TREE}/src/*.h ${TREE}/src/*.cpp ${TREE}/client/*.h ${TREE}/client/*.cpp
-     ${TREE}/telephony-service/*.h ${TREE}/telephony-service/*.cpp ${TREE}/bridge/*.h ${TREE}/bridge/*.cpp
-     ${TREE}/tools/*.h ${TREE}/tools/*.cpp)
+foreach(part src client capi telephony-service bridge tools)
+  file(GLOB_RECURSE found RELATIVE ${TREE} ${TREE}/${part}/*.h ${TREE}/${part}/*.c ${TREE}/${part}/*.cpp)
+  list(APPEND files ${found})
+endforeach()
 foreach(file IN LISTS files)
   check_file(${file})
 endforeach()

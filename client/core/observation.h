@@ -6,8 +6,8 @@
 namespace quorvel::client {
 
 struct Notice {
-  enum class Kind { taken_in, notification, missed };
-  Kind kind{};
+  enum class Kind { taken_in = 1, notification, missed };
+  Kind kind = Kind::taken_in;
   std::uint64_t sequence = 0;  // of the notification; else the newest when taken in, the last one missed
   std::uint64_t missed = 0;    // how many notifications were dropped because the observer read too slowly
   std::string_view name = {};  // valid until the next step

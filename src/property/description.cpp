@@ -181,11 +181,11 @@ void TextSink::put_escaped(std::string_view text) noexcept {
   for (std::size_t at = 0; at < text.size() && !full_;) {
     std::size_t plain = at;
     while (plain < text.size() && is_plain(text[plain])) ++plain;
-    put(text.substr(at, plain - at));
+    put({text.data() + at, plain - at});
     at = plain;
     if (at == text.size()) return;
     const std::size_t length = utf8_character_length(text, at);
-    const std::string_view character = text.substr(at, std::max<std::size_t>(length, 1));
+    const std::string_view character(text.data() + at, std::max<std::size_t>(length, 1));
     if (length == 0 || is_unsafe_to_display(character)) {
       put_escape(character, *this);
     } else {

@@ -1,0 +1,42 @@
+# The functions that the header declares, those that the list names and those that the library exports are the same, and
+# the library needs nothing but the C library. Run as: cmake -DTREE=… -DLIBRARY=… -DNM=… [-DREADELF=…] -P check-symbols.cmake
+file(STRINGS ${TREE}/capi/quorvel.map lines REGEX "^ +quorvel_[a-z_]+;$")
+foreach(line IN LISTS lines)
+  string(REGEX MATCH "quorvel_[a-z_]+" name ${line})
+  list(APPEND listed ${name})
+endforeach()
+
+file(STRINGS ${TREE}/capi/include/quorvel.h lines REGEX "^QUORVEL_API ")
+foreach(line IN LISTS lines)
+  string(REGEX MATCH "(quorvel_[a-z_]+)\\(" name ${line})
+  list(APPEND declared ${CMAKE_MATCH_1})
+endforeach()
+
+execute_process(COMMAND ${NM} -D --defined-only ${LIBRARY} OUTPUT_VARIABLE output COMMAND_ERROR_IS_FATAL ANY)
+string(REGEX MATCHALL "[^\n]+" lines "${output}")
+foreach(line IN LISTS lines)
+  string(REGEX REPLACE "^[0-9a-f]* [A-Za-z] " "" symbol ${line})
+  if(symbol MATCHES "^(.*)@@QUORVEL_1$")
+    list(APPEND exported ${CMAKE_MATCH_1})
+  elseif(NOT symbol STREQUAL QUORVEL_1)
+    message(SEND_ERROR "${symbol} is exported without being in the list")
+  endif()
+endforeach()
+
+foreach(set listed declared exported)
+  list(SORT ${set})
+endforeach()
+list(LENGTH listed count)
+if(count LESS 40 OR NOT "${listed}" STREQUAL "${declared}" OR NOT "${listed}" STREQUAL "${exported}")
+  message(SEND_ERROR "the three differ:\nlisted    ${listed}\ndeclared  ${declared}\nexported  ${exported}")
+endif()
+
+# What the compiler would inline, a build without optimisation takes from the C++ library.
+if(READELF)
+  execute_process(COMMAND ${READELF} -d ${LIBRARY} OUTPUT_VARIABLE output COMMAND_ERROR_IS_FATAL ANY)
+  string(REGEX MATCHALL "lib[a-z+_-]+\\.so\\.[0-9]+|ld-linux[a-z0-9_.-]+" libraries "${output}")
+  list(FILTER libraries EXCLUDE REGEX "^(libquorvel|libc|libm|ld-linux)")
+  if(libraries)
+    message(SEND_ERROR "needs more than the C library: ${libraries}")
+  endif()
+endif()
