@@ -168,8 +168,8 @@ class DictionaryRange {
   DictionaryRange(const detail::Entry* first, const detail::Entry* last) noexcept : first_(first), last_(last) {}
   [[nodiscard]] iterator begin() const noexcept { return {first_, last_}; }
   [[nodiscard]] iterator end() const noexcept { return {last_, last_}; }
-  /// The first live entry in slot `position` or behind it, and in `position` the slot behind that entry, for a walk that
-  /// is left and taken up again; null at the end.
+  /// The first live entry in slot `position` or behind it; `position` becomes the slot behind that entry, so that a
+  /// walk can be left and taken up again. Null at the end.
   [[nodiscard]] const detail::Entry* next(std::size_t& position) const noexcept {
     for (const auto slots = static_cast<std::size_t>(last_ - first_); position < slots;) {
       const detail::Entry& entry = first_[position++];
