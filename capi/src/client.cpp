@@ -10,8 +10,13 @@ using quorvel::client::Progress;
 static_assert(quorvel::protocol::kCopyRegulatoryImages == QUORVEL_COPY_REGULATORY_IMAGES);
 
 bool OwnedText::set(const char* text) noexcept {
-  char* copy = text != nullptr ? ::strdup(text) : nullptr;
-  if (text != nullptr && copy == nullptr) return false;
+  char* copy = nullptr;
+  if (text != nullptr) {
+    const std::size_t size = std::strlen(text) + 1;
+    copy = static_cast<char*>(std::malloc(size));
+    if (copy == nullptr) return false;
+    std::memcpy(copy, text, size);
+  }
   std::free(std::exchange(text_, copy));
   return true;
 }
