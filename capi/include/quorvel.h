@@ -26,7 +26,7 @@
 #include <stdint.h>
 
 #if defined(__GNUC__)
-#define QUORVEL_API __attribute__((visibility("default"), nothrow))
+#define QUORVEL_API __attribute__((visibility("default")))
 #else
 #define QUORVEL_API
 #endif
