@@ -35,10 +35,10 @@ PropertyValue copyPostponementStuff(PropertyValue* status) noexcept {
     return {};
   }
   PropertyValue info;
-  const platform::TelephonyError error = connection.copy_postponement_status(info);
+  const platform::TelephonyError error = connection.query(platform::TelephonyField::postponement, info);
   if (error.code != 0) {
-    daemon_log(0, kCopy, "_TelvaneServerConnectionCopyPostponementStatus() error: %ld.%ld", long{error.domain},
-               long{error.code});
+    daemon_log(0, kCopy, "%s() error: %ld.%ld", platform::row_of(platform::TelephonyField::postponement).query,
+               long{error.domain}, long{error.code});
     return {};
   }
   if (!info) {

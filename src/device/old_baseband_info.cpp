@@ -1,3 +1,5 @@
+#include <iterator>
+
 #include "device/baseband_info.h"
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
@@ -10,42 +12,24 @@ namespace {
 constexpr const char* kFunction = "lookup_baseband_info_old";
 
 using platform::TelephonyConnection;
-using Query = platform::TelephonyError (TelephonyConnection::*)(PropertyValue&) const noexcept;
+using platform::TelephonyField;
 
-// What one run's queries delivered; none where nothing was.
+// The answers of one run, by query; none where nothing was delivered.
 struct Facts {
-  PropertyValue sim_identity;
-  PropertyValue subscriber_identity;
-  PropertyValue firmware_version;
-  PropertyValue bootloader_version;
-  PropertyValue gid1;
-  PropertyValue gid2;
+  PropertyValue values[std::size(platform::kTelephonyFields)];
+  [[nodiscard]] PropertyValue& operator[](TelephonyField field) noexcept {
+    return values[static_cast<std::size_t>(field)];
+  }
 };
 
-struct QueryStep {
-  const char* name;
-  Query query;
-  PropertyValue Facts::*slot;
-};
-
-constexpr QueryStep kQueries[] = {
-    {"_TelvaneServerConnectionCopySIMIdentity", &TelephonyConnection::copy_sim_identity, &Facts::sim_identity},
-    {"_TelvaneServerConnectionCopyMobileSubscriberIdentity", &TelephonyConnection::copy_mobile_subscriber_identity,
-     &Facts::subscriber_identity},
-    {"_TelvaneServerConnectionCopyFirmwareVersion", &TelephonyConnection::copy_firmware_version,
-     &Facts::firmware_version},
-    {"_TelvaneServerConnectionCopyBootloaderVersion", &TelephonyConnection::copy_bootloader_version,
-     &Facts::bootloader_version},
-    {"_TelvaneServerConnectionCopyGid1", &TelephonyConnection::copy_gid1, &Facts::gid1},
-    {"_TelvaneServerConnectionCopyGid2", &TelephonyConnection::copy_gid2, &Facts::gid2},
-};
-
+// The radio info is asked for on devices with the other baseband.
 Facts query_all(const TelephonyConnection& connection) noexcept {
   Facts facts;
-  for (const QueryStep& step : kQueries) {
-    const platform::TelephonyError error = (connection.*step.query)(facts.*step.slot);
+  for (const platform::TelephonyFieldRow& row : platform::kTelephonyFields) {
+    if (row.field == TelephonyField::postponement) continue;
+    const platform::TelephonyError error = connection.query(row.field, facts[row.field]);
     if (error.code != 0) {
-      daemon_log(0, kFunction, "%s() error: %ld.%ld", step.name, long{error.domain}, long{error.code});
+      daemon_log(0, kFunction, "%s() error: %ld.%ld", row.query, long{error.domain}, long{error.code});
     }
   }
   return facts;
@@ -113,13 +97,15 @@ void lookup_baseband_info_old(DataArk* ark) noexcept {
     daemon_log(0, kFunction, "Could not connect to Telvane");
     return;
   }
-  const Facts facts = query_all(connection);
-  update_identity(ark, "ICCID", keys::kIntegratedCircuitCardIdentity, facts.sim_identity);
-  update_identity(ark, "IMSI", keys::kInternationalMobileSubscriberIdentity, facts.subscriber_identity);
-  insert_version(ark, "baseband version", keys::kBasebandVersion, 0, facts.firmware_version);
-  store_group_identifier(ark, keys::kSIMGID1, facts.gid1);
-  store_group_identifier(ark, keys::kSIMGID2, facts.gid2);
-  insert_version(ark, "baseband bootloader version", keys::kBasebandBootloaderVersion, 1, facts.bootloader_version);
+  Facts facts = query_all(connection);
+  update_identity(ark, "ICCID", keys::kIntegratedCircuitCardIdentity, facts[TelephonyField::sim_identity]);
+  update_identity(ark, "IMSI", keys::kInternationalMobileSubscriberIdentity,
+                  facts[TelephonyField::mobile_subscriber_identity]);
+  insert_version(ark, "baseband version", keys::kBasebandVersion, 0, facts[TelephonyField::firmware_version]);
+  store_group_identifier(ark, keys::kSIMGID1, facts[TelephonyField::gid1]);
+  store_group_identifier(ark, keys::kSIMGID2, facts[TelephonyField::gid2]);
+  insert_version(ark, "baseband bootloader version", keys::kBasebandBootloaderVersion, 1,
+                 facts[TelephonyField::bootloader_version]);
 }
 
 }  // namespace quorvel

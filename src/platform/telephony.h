@@ -2,7 +2,10 @@
 // are answered from the last state received, so nothing here waits for anybody. Main thread only.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
+#include <iterator>
+#include <string_view>
 
 #include "platform/run_loop.h"
 #include "property/value.h"
@@ -14,6 +17,46 @@ struct TelephonyError {
   std::int32_t domain = 0;
   std::int32_t code = 0;
 };
+
+/// The queries that a connection answers.
+enum class TelephonyField : std::uint8_t {
+  sim_identity,
+  mobile_subscriber_identity,
+  firmware_version,
+  bootloader_version,
+  gid1,
+  gid2,
+  postponement,
+};
+
+/// A query's field in the service's state, and its name in the log. A new field is a row here and its enumerator.
+struct TelephonyFieldRow {
+  TelephonyField field;
+  std::string_view name;
+  const char* query;
+};
+
+inline constexpr TelephonyFieldRow kTelephonyFields[] = {
+    {TelephonyField::sim_identity, "iccid", "_TelvaneServerConnectionCopySIMIdentity"},
+    {TelephonyField::mobile_subscriber_identity, "imsi", "_TelvaneServerConnectionCopyMobileSubscriberIdentity"},
+    {TelephonyField::firmware_version, "firmware-version", "_TelvaneServerConnectionCopyFirmwareVersion"},
+    {TelephonyField::bootloader_version, "bootloader-version", "_TelvaneServerConnectionCopyBootloaderVersion"},
+    {TelephonyField::gid1, "gid1", "_TelvaneServerConnectionCopyGid1"},
+    {TelephonyField::gid2, "gid2", "_TelvaneServerConnectionCopyGid2"},
+    {TelephonyField::postponement, "postponement", "_TelvaneServerConnectionCopyPostponementStatus"},
+};
+
+[[nodiscard]] constexpr const TelephonyFieldRow& row_of(TelephonyField field) noexcept {
+  return kTelephonyFields[static_cast<std::size_t>(field)];
+}
+
+// The rows stand in the order of the enumerators.
+static_assert([] {
+  for (std::size_t i = 0; i < std::size(kTelephonyFields); ++i) {
+    if (kTelephonyFields[i].field != static_cast<TelephonyField>(i)) return false;
+  }
+  return true;
+}());
 
 inline constexpr StaticText kSimNewlyInserted = "sim-newly-inserted";
 inline constexpr StaticText kSimStatusChanged = "sim-status-changed";
@@ -51,18 +94,11 @@ class TelephonyConnection {
   [[nodiscard]] static TelephonyConnection open(Callback callback, void* context) noexcept;
   [[nodiscard]] explicit operator bool() const noexcept { return static_cast<bool>(state_); }
 
-  /// Each fills `value` with what the service delivers, which may be none and of any kind, and returns the error pair.
-  TelephonyError copy_sim_identity(PropertyValue& value) const noexcept;
-  TelephonyError copy_mobile_subscriber_identity(PropertyValue& value) const noexcept;
-  TelephonyError copy_firmware_version(PropertyValue& value) const noexcept;
-  TelephonyError copy_bootloader_version(PropertyValue& value) const noexcept;
-  TelephonyError copy_gid1(PropertyValue& value) const noexcept;
-  TelephonyError copy_gid2(PropertyValue& value) const noexcept;
-  /// Delivers a dictionary or none: a radio info of another kind counts as not delivered.
-  TelephonyError copy_postponement_status(PropertyValue& value) const noexcept;
+  /// Fills `value` with the service's answer, which may be none and of any kind, and returns the error pair. A radio
+  /// info (`postponement`) that is no dictionary counts as not delivered.
+  TelephonyError query(TelephonyField field, PropertyValue& value) const noexcept;
 
  private:
-  TelephonyError copy(std::string_view field, PropertyValue& value) const noexcept;
   PropertyValue state_;
 };
 

@@ -24,6 +24,15 @@ inline constexpr StaticText kGid2Field = "gid2";
 inline constexpr StaticText kPostponementField = "postponement";
 inline constexpr StaticText kConnectionField = "connection";
 
+// The queries' fields are named once more as texts that are values; each is its row's name.
+static_assert(kIccidField.text() == platform::kTelephonyFields[0].name &&
+              kImsiField.text() == platform::kTelephonyFields[1].name &&
+              kFirmwareVersionField.text() == platform::kTelephonyFields[2].name &&
+              kBootloaderVersionField.text() == platform::kTelephonyFields[3].name &&
+              kGid1Field.text() == platform::kTelephonyFields[4].name &&
+              kGid2Field.text() == platform::kTelephonyFields[5].name &&
+              kPostponementField.text() == platform::kTelephonyFields[6].name);
+
 /// Every field, in the order in which people are shown them.
 inline constexpr std::string_view kStateFields[] = {
     kSimStatusField.text(),         kIccidField.text(), kImsiField.text(), kFirmwareVersionField.text(),

@@ -22,9 +22,9 @@ std::string everything() {
   const TelephonyConnection connection = TelephonyConnection::open(nullptr, nullptr);
   if (!connection) return all + ", no connection";
   PropertyValue value;
-  std::string error = described_error(connection.copy_sim_identity(value));
+  std::string error = described_error(connection.query(TelephonyField::sim_identity, value));
   all += ", iccid " + described(value) + " " + error;
-  error = described_error(connection.copy_postponement_status(value));
+  error = described_error(connection.query(TelephonyField::postponement, value));
   return all + ", postponement " + described(value) + " " + error;
 }
 

@@ -17,37 +17,9 @@ TelephonyConnection TelephonyConnection::open(Callback, void*) noexcept {
   return connection;
 }
 
-TelephonyError TelephonyConnection::copy(std::string_view field, PropertyValue& value) const noexcept {
-  return wire::take_answer(state_, field, value);
-}
-
-TelephonyError TelephonyConnection::copy_sim_identity(PropertyValue& value) const noexcept {
-  return copy(wire::kIccidField.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_mobile_subscriber_identity(PropertyValue& value) const noexcept {
-  return copy(wire::kImsiField.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_firmware_version(PropertyValue& value) const noexcept {
-  return copy(wire::kFirmwareVersionField.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_bootloader_version(PropertyValue& value) const noexcept {
-  return copy(wire::kBootloaderVersionField.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_gid1(PropertyValue& value) const noexcept {
-  return copy(wire::kGid1Field.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_gid2(PropertyValue& value) const noexcept {
-  return copy(wire::kGid2Field.text(), value);
-}
-
-TelephonyError TelephonyConnection::copy_postponement_status(PropertyValue& value) const noexcept {
-  const TelephonyError error = copy(wire::kPostponementField.text(), value);
-  if (!value.is_dictionary()) value = nullptr;
+TelephonyError TelephonyConnection::query(TelephonyField field, PropertyValue& value) const noexcept {
+  const TelephonyError error = wire::take_answer(state_, row_of(field).name, value);
+  if (field == TelephonyField::postponement && !value.is_dictionary()) value = nullptr;
   return error;
 }
 
