@@ -1,14 +1,27 @@
 #include "platform/device_information.h"
 
-#include "linux/device/device_sources.h"
+#include <algorithm>
+#include <utility>
+
+#include "linux/base/small_file.h"
+#include "linux/device/source_table.h"
 #include "platform/device_paths.h"
 
 namespace quorvel::platform {
 
+// Packaging knows the device better than the kernel does, so its file is asked first, whatever the question.
 DeviceAnswer copy_device_answer_with_origin(std::string_view question) noexcept {
-  PropertyValue answer = host::answer_from_file(question);
-  if (!answer) return {};
-  return {std::move(answer), PropertyValue::string(paths::kDeviceInformation)};
+  if (PropertyValue answer = host::read_file_entry(paths::kDeviceInformation, question)) {
+    return {std::move(answer), PropertyValue::string(paths::kDeviceInformation)};
+  }
+  const auto* row =
+      std::ranges::find_if(host::kQuestionSources, [question](const auto& one) { return one.question == question; });
+  if (row == std::end(host::kQuestionSources)) return {};
+  for (const host::Source source : row->sources) {
+    if (source == nullptr) break;
+    if (DeviceAnswer answer = source(); answer.value) return answer;
+  }
+  return {};
 }
 
 }  // namespace quorvel::platform

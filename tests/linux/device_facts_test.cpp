@@ -1,0 +1,248 @@
+// The live answers, asked of machines that are described in a scratch root.
+#include <sys/utsname.h>
+
+#include "linux/device/source_table.h"
+#include "linux/device/sources/machine_id.h"
+#include "platform/device_information.h"
+#include "platform/device_paths.h"
+#include "support/scratch_root.h"
+
+namespace quorvel::test {
+namespace {
+
+using namespace platform;
+using namespace std::string_literals;
+
+// A machine: one line for each file, "PATH = CONTENT" with \0, \n, \r and \e in it, or "PATH -> TARGET" for a link. A
+// first line that ends in "/" is the directory that the next ones lie in.
+void unfold(ScratchRoot& root, const std::string& description) {
+  std::istringstream lines(description);
+  std::string folder;
+  for (std::string line; std::getline(lines, line);) {
+    const std::size_t value = line.find(" = ");
+    const std::size_t link = line.find(" -> ");
+    if (value == std::string::npos && link == std::string::npos) {
+      folder = line;
+      root.make_directory(folder);
+    } else if (value == std::string::npos) {
+      root.make_link(line.substr(link + 4), folder + line.substr(0, link));
+    } else {
+      std::string content;
+      for (std::size_t i = value + 3; i < line.size(); ++i) {
+        const bool escaped = line[i] == '\\' && i + 1 < line.size();
+        const char c = escaped ? line[++i] : line[i];
+        content += !escaped ? c : c == '0' ? '\0' : c == 'n' ? '\n' : c == 'r' ? '\r' : c == 'e' ? '\x1b' : c;
+      }
+      root.write_file(folder + line.substr(0, value), content);
+    }
+  }
+}
+
+const std::string kTree = std::string(paths::kDeviceTree) + "/\n";
+const std::string kDmi = std::string(paths::kFirmwareTable) + "/\n";
+const std::string kNet = std::string(paths::kNetworkInterfaces) + "/\n";
+const std::string kSupplies = std::string(paths::kPowerSupplies) + "/\n";
+const std::string kRfkill = std::string(paths::kRadioSwitches) + "/\n";
+
+const std::string kPhone =
+    kTree +
+    "compatible = pine64,pinephone-1.2\\0pine64,pinephone\\0allwinner,sun50i-a64\\0\n"
+    "model = Pine64 PinePhone (1.2)\\0\nserial-number = 02c00081\\0\nchosen/u-boot,version = 2022.01\\0\n"
+    "aliases/bluetooth0 = /soc/serial/bluetooth\\0\n"
+    "soc/serial/bluetooth/local-bd-address = \x55\x44\x33\x22\x11\\0\n" +
+    kSupplies +
+    "axp20x-battery/type = Battery\naxp20x-battery/status = Charging\naxp20x-battery/capacity = 43\n"
+    "axp20x-usb/type = USB\naxp20x-usb/online = 1\n" +
+    kRfkill +
+    "rfkill0/type = wlan\nrfkill0/soft = 1\nrfkill0/hard = 0\nrfkill1/type = bluetooth\nrfkill1/soft = 0\n"
+    "rfkill1/hard = 1\nrfkill2/type = gps\nrfkill2/soft = 0\n" +
+    kNet +
+    "wlan0/phy80211/macaddress = 3c:6a:9d:00:11:22\nwlan0/phy80211/index = 0\nwlan0/addr_assign_type = 3\n"
+    "wlan0/address = ba:00:00:00:00:01\nwlan0/device/x = \nwlan0/type = 1\nwlan0/ifindex = 2\n" +
+    "/sys/class/wwan/wwan0/\ntype = \n";
+
+const std::string kLaptop =
+    kDmi +
+    "sys_vendor = LENOVO\\n\nproduct_name = 20QQS0JD01\\n\nproduct_version = ThinkPad P53\\n\n"
+    "board_name = Default string\\n\nproduct_sku = LENOVO_MT_20QQ\\n\nbios_version = N2NET34W (1.12 )\\n\n"
+    "product_serial = PF1ABCDE\\n\nboard_serial = 00000000\\n\n" +
+    "/etc/\nmachine-id = 0123456789abcdef0123456789abcdef\\n\nos-release -> /usr/lib/os-release\n"
+    "/usr/lib/\nos-release = # comment\\nVERSION_ID=\"11\"\\nVERSION_ID='12'\\r\\nBUILD_ID=rolling\\n\n" +
+    kSupplies +
+    "BAT0/type = Battery\nBAT0/status = Unknown\nBAT0/energy_now = 10000000\nBAT0/energy_full = 20000000\n"
+    "BAT1/type = Battery\nBAT1/status = Discharging\nBAT1/energy_now = 15000000\n"
+    "BAT1/energy_full = 60000000\nAC/type = Mains\nAC/online = 0\n" +
+    "/sys/devices/pci0/0000:00:1f.6/net/eth1/\naddress = 54:e1:ad:00:00:02\\n\naddr_assign_type = 0\ntype = 1\n"
+    "ifindex = 3\ndevice -> ../../../0000:00:1f.6\n" +
+    kNet +
+    "eth1 -> ../../devices/pci0/0000:00:1f.6/net/eth1\n"
+    "eth0/address = 54:e1:ad:00:00:01\neth0/addr_assign_type = 1\neth0/type = 1\neth0/ifindex = 2\n"
+    "eth0/device/x = \nbr0/address = 54:e1:ad:00:00:09\nbr0/addr_assign_type = 0\nbr0/type = 1\nbr0/ifindex = 1\n";
+
+const std::string kVirtualMachine = kTree + "compatible = linux,dummy-virt\\0\nmodel = linux,dummy-virt\\0\n" + kDmi +
+                                    "product_name = To Be Filled By O.E.M.\\n\nboard_name = B450M\\n\n" + kNet +
+                                    "eth0/address = 02:fc:00:00:00:01\neth0/addr_assign_type = 0\neth0/type = 1\n"
+                                    "eth0/ifindex = 4\neth0/device/x = \n";
+
+// What the machine answers, one "QUESTION = VALUE" each; nothing else may have an answer.
+std::map<std::string, std::string> answers() {
+  std::map<std::string, std::string> all;
+  for (const DeviceQuestion& question : kDeviceQuestions) {
+    const DeviceAnswer answer = copy_device_answer_with_origin(question.name);
+    EXPECT_EQ(static_cast<bool>(answer.value), static_cast<bool>(answer.origin)) << question.name;
+    if (!answer.value || question.name == "CPUArchitecture") continue;
+    EXPECT_EQ(answer.value.kind(), question.kind) << question.name;
+    const PropertyValue& value = answer.value;
+    all.emplace(question.name, value.is_string()                       ? std::string(value.text())
+                               : value.kind() == PropertyKind::boolean ? (value.to_boolean() ? "true" : "false")
+                                                                       : std::to_string(*value.to_int64()));
+  }
+  return all;
+}
+
+using Answers = std::map<std::string, std::string>;
+
+TEST(DeviceFacts, APhoneIsDescribedByItsDeviceTree) {
+  ScratchRoot root;
+  unfold(root, kPhone);
+  EXPECT_EQ(answers(), (Answers{{"AirplaneMode", "true"},
+                                {"BatteryCurrentCapacity", "43"},
+                                {"BatteryIsCharging", "true"},
+                                {"BatteryIsFullyCharged", "false"},
+                                {"BluetoothAddress", "00:11:22:33:44:55"},
+                                {"ExternalChargeCapability", "true"},
+                                {"ExternalPowerSourceConnected", "true"},
+                                {"FirmwareVersion", "2022.01"},
+                                {"HWModelStr", "pine64,pinephone-1.2"},
+                                {"HardwarePlatform", "allwinner,sun50i-a64"},
+                                {"HasBaseband", "true"},
+                                {"ProductType", "pine64,pinephone-1.2"},
+                                {"SerialNumber", "02c00081"},
+                                {"WifiAddress", "3c:6a:9d:00:11:22"},
+                                {"gas-gauge-battery", "false"},
+                                {"marketing-name", "Pine64 PinePhone (1.2)"},
+                                {"wifi", "true"}}));
+}
+
+TEST(DeviceFacts, ALaptopIsDescribedByItsFirmwareTable) {
+  ScratchRoot root;
+  unfold(root, kLaptop);
+  Answers found = answers();
+  const std::string identifier = found["UniqueDeviceID"];
+  EXPECT_EQ(identifier.size(), 32u);
+  EXPECT_EQ(identifier.find("01234567"), std::string::npos) << "the machine-id itself left the machine";
+  found.erase("UniqueDeviceID");
+  EXPECT_EQ(found, (Answers{{"BatteryCurrentCapacity", "31"},
+                            {"BatteryIsCharging", "false"},
+                            {"BatteryIsFullyCharged", "false"},
+                            {"BuildVersion", "rolling"},
+                            {"EthernetMacAddress", "54:e1:ad:00:00:02"},
+                            {"ExternalChargeCapability", "false"},
+                            {"ExternalPowerSourceConnected", "false"},
+                            {"FirmwareVersion", "N2NET34W (1.12 )"},
+                            {"HWModelStr", "20QQS0JD01"},
+                            {"ModelNumber", "LENOVO_MT_20QQ"},
+                            {"ProductType", "20QQS0JD01"},
+                            {"ProductVersion", "12"},
+                            {"SerialNumber", "PF1ABCDE"},
+                            {"gas-gauge-battery", "true"},
+                            {"marketing-name", "ThinkPad P53"},
+                            {"wifi", "false"}}));
+  EXPECT_EQ(copy_device_answer_with_origin("ProductType").origin, text("/sys/class/dmi/id/product_name"));
+  root.write_plist(paths::kDeviceInformation, dictionary({{"ProductType", "Ours"}, {"BoardId", 7}}));
+  EXPECT_EQ(copy_device_answer("ProductType"), text("Ours"));
+  EXPECT_EQ(copy_device_answer_with_origin("BoardId").origin, text(paths::kDeviceInformation));
+}
+
+TEST(DeviceFacts, AnUnknownMachineIsNotInvented) {
+  ScratchRoot root;
+  EXPECT_EQ(answers(), Answers{});
+  unfold(root, kVirtualMachine);
+  EXPECT_EQ(answers(), (Answers{{"EthernetMacAddress", "02:fc:00:00:00:01"},
+                                {"HWModelStr", "B450M"},
+                                {"marketing-name", "B450M"},
+                                {"wifi", "false"}}));
+  struct utsname system;
+  ASSERT_EQ(::uname(&system), 0);
+  EXPECT_EQ(copy_device_answer("CPUArchitecture"), text(system.machine));
+}
+
+TEST(DeviceFacts, OddCases) {
+  const std::string bat = "BAT0/type = Battery\nBAT0/status = Not charging\n";
+  const struct {
+    std::string files;
+    const char* question;
+    const char* expected;  // empty: none
+  } cases[] = {
+      {kDmi + "product_name = X\\e[31mred\n", "ProductType", ""},
+      {kDmi + "product_name = \xff\xfe\n", "ProductType", ""},
+      {kDmi + "product_name = ........\n", "ProductType", ""},
+      {kDmi + "product_name =  My default \n", "ProductType", "My default"},
+      {kDmi + "product_serial = ab\n", "SerialNumber", ""},
+      {"/proc/\ncpuinfo = Hardware : X\\nSerial\t\t: 00000000abcd\\n\n", "SerialNumber", "00000000abcd"},
+      {"/proc/\ncmdline = quiet androidboot.serialno=XY12 ro\\n\n", "SerialNumber", "XY12"},
+      {"/sys/devices/soc0/\nsoc_id = jep106:036b:0000\n", "ChipID", ""},
+      {"/sys/devices/soc0/\nsoc_id = 321\\n\n", "ChipID", "321"},
+      {"/sys/devices/soc0/\nserial_number = 0x1234abcd\\n\n", "UniqueChipID", "305441741"},
+      {"/sys/devices/soc0/\nserial_number = 0x10000000000000000\n", "UniqueChipID", ""},
+      {"/etc/\nmachine-info = HARDWARE_MODEL=\"My \\\\\"Phone\\\\\"\"\\n\n", "marketing-name", "My \"Phone\""},
+      {"/etc/\nos-release = VERSION_ID=1\\nVERSION_ID=\"2\" x\\nVERSION_ID='3\\n\n", "ProductVersion", "1"},
+      {"/etc/\nos-release = VERSION_ID=a\\\\ b\\n\n/usr/lib/\nos-release = BUILD_ID=9\\n\n", "ProductVersion", "a b"},
+      {"/etc/\nos-release = X=1\\n\n/usr/lib/\nos-release = BUILD_ID=9\\n\n", "BuildVersion", ""},
+      {"/etc/\nmachine-id = uninitialized\\n\n", "UniqueDeviceID", ""},
+      {kSupplies + bat + "BAT0/capacity = 80\nAC/type = Mains\nAC/online = 1\n", "BatteryIsFullyCharged", "false"},
+      {kSupplies + bat + "BAT0/capacity = 100\n", "BatteryIsFullyCharged", "true"},
+      {kSupplies + bat + "BAT0/charge_now = 1500000\nBAT0/charge_full = 3000000\n", "BatteryCurrentCapacity", "50"},
+      {kSupplies + bat + "BAT0/capacity/x = \nBAT0/energy_now = 9000000000\nBAT0/energy_full = 9\n",
+       "BatteryCurrentCapacity", "100"},
+      {kSupplies + bat + "BAT0/capacity = 58\nBAT0/present = 0\n", "BatteryCurrentCapacity", ""},
+      {kSupplies + bat + "BAT0/capacity = 58\nAAA/type = Battery\nAAA/scope = Device\nAAA/capacity = 15\n",
+       "BatteryCurrentCapacity", "58"},
+      {kSupplies + "AC/type = Mains\nAC/online = 0\nucsi/type = USB_PD\nucsi/online = 2\n",
+       "ExternalPowerSourceConnected", "true"},
+      {kRfkill + "rfkill0/type = wlan\nrfkill0/soft = 0\nrfkill1/type = bluetooth\nrfkill1/soft = 1\n", "AirplaneMode",
+       "false"},
+      {kRfkill + "rfkill0/type = nfc\nrfkill0/soft = 1\n", "AirplaneMode", ""},
+      {kNet + "wlan0/phy80211/macaddress = 3c:6a:9d:00:11:22\nwlan0/addr_assign_type = 1\n"
+              "wlan0/address = 3c:6a:9d:00:11:22\nwlan0/device/x = \n",
+       "WifiAddress", ""},
+      {kNet + "wwan0/uevent = A=1\\nDEVTYPE=wwan\\n\n", "HasBaseband", "true"},
+      {kNet + "eth0/address = 01:00:5e:00:00:01\neth0/addr_assign_type = 0\neth0/type = 1\neth0/device/x = \n",
+       "EthernetMacAddress", ""},
+      {"/sys/bus/sdio/devices/\nmmc1:1/net/wlan0/x = \nmmc1:1/info1 = WLAN\nmmc1:1/info2 = rev1\n", "SDIOProductInfo",
+       "WLAN rev1"},
+  };
+  ScratchRoot root;
+  for (const auto& c : cases) {
+    for (const char* folder : {"/sys", "/proc", "/etc", "/usr"}) root.remove(folder);
+    unfold(root, c.files);
+    const Answers found = answers();
+    const auto at = found.find(c.question);
+    EXPECT_EQ(at == found.end() ? "" : at->second, c.expected) << c.files;
+  }
+}
+
+TEST(DeviceFacts, AHostileFileIsAMissingFact) {
+  ScratchRoot root;
+  root.make_directory("/sys/class/dmi/id");
+  root.make_fifo("/sys/class/dmi/id/product_name");
+  root.write_file("/sys/class/dmi/id/board_name", std::string(1u << 20, 'x') + "y");
+  root.make_directory("/sys/class/dmi/id/product_sku");
+  root.make_link("/sys/class/power_supply", "/sys/class/power_supply");
+  EXPECT_EQ(answers(), Answers{});
+}
+
+TEST(DeviceFacts, TheIdentifierIsTheOneThatOtherToolsDerive) {
+  const auto bytes = [](std::string_view hexadecimal) {
+    std::array<std::byte, 16> all;
+    for (std::size_t i = 0; i < 16; ++i)
+      all[i] = static_cast<std::byte>(std::stoi(std::string(hexadecimal.substr(2 * i, 2)), nullptr, 16));
+    return all;
+  };
+  const auto text =
+      host::derive_identifier(bytes("0123456789abcdef0123456789abcdef"), bytes("5d1f2c3b4a5968778695a4b3c2d1e0ff"));
+  EXPECT_EQ(std::string(text.begin(), text.end()), "e0918de3171a4b559087067af889aba4");
+}
+
+}  // namespace
+}  // namespace quorvel::test
