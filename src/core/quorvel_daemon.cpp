@@ -1,7 +1,5 @@
 #include "core/quorvel_daemon.h"
 
-#include <utility>
-
 #include "files/property_list_file.h"
 #include "log/daemon_log.h"
 #include "platform/device_paths.h"
@@ -21,13 +19,13 @@ PropertyValue copy_regulatory_images(CheckedBytes& bytes) noexcept {
 }
 
 // The shape of a call is settled here, so that the operation itself has no error to send.
-void invoke_copy_regulatory_images(void* object, const PropertyValue& argument, platform::IpcReply reply) noexcept {
-  if (argument) {
+void invoke_copy_regulatory_images(void* object, const platform::IpcCall& call, platform::IpcReply& reply) noexcept {
+  if (call.argument) {
     const platform::IpcError error{protocol::kUnexpectedArgument, "the operation takes no argument"};
     if (reply) reply.send(nullptr, &error);
     return;
   }
-  static_cast<const QuorvelDaemon*>(object)->copyRegulatoryImagesWithCompletionBlock(std::move(reply));
+  static_cast<const QuorvelDaemon*>(object)->copyRegulatoryImagesWithCompletionBlock(reply);
 }
 
 constexpr platform::IpcOperation kOperations[] = {{protocol::kCopyRegulatoryImages, invoke_copy_regulatory_images}};
@@ -42,7 +40,7 @@ bool QuorvelDaemon::accept(void* object, platform::IpcListener*, platform::IpcCo
   return true;
 }
 
-void QuorvelDaemon::copyRegulatoryImagesWithCompletionBlock(platform::IpcReply reply) const noexcept {
+void QuorvelDaemon::copyRegulatoryImagesWithCompletionBlock(platform::IpcReply& reply) const noexcept {
   CheckedBytes bytes;
   const PropertyValue images = copy_regulatory_images(bytes);
   if (!reply) return;

@@ -21,7 +21,7 @@ class QuorvelDaemon {
 
   /// Answers with the regulatory images dictionary, or none, and never an error. The file is read anew for each call,
   /// also for one that wants no reply. Any thread.
-  void copyRegulatoryImagesWithCompletionBlock(platform::IpcReply reply) const noexcept;
+  void copyRegulatoryImagesWithCompletionBlock(platform::IpcReply& reply) const noexcept;
 
  private:
   std::atomic<DataArk*> dark_{nullptr};

@@ -2,6 +2,8 @@
 // Accept callbacks and operations run on the service's own threads, several at once.
 #pragma once
 
+#include <sys/types.h>
+
 #include <cstdint>
 #include <span>
 #include <string_view>
@@ -23,14 +25,21 @@ struct IpcError {
 class IpcConnection;
 class IpcListener;
 
-/// The client's way to be answered. Empty when the client wants no reply. Ends unanswered if it is never sent.
+/// Who makes a call: the user and the process that connected, as the kernel knew them then. A user of -1 is not known.
+struct IpcCaller {
+  uid_t user = static_cast<uid_t>(-1);
+  pid_t process = 0;
+};
+
+/// The client's way to be answered, for as long as the operation runs: it can neither be kept nor be handed on, so that
+/// nothing can be sent to a connection that is gone by then. Empty when the client wants no reply. A call that the
+/// operation does not answer stays unanswered.
 class IpcReply {
  public:
   explicit IpcReply(IpcConnection* connection = nullptr, std::uint64_t serial = 0) noexcept
       : connection_(connection), serial_(serial) {}
-  IpcReply(IpcReply&& other) noexcept
-      : connection_(std::exchange(other.connection_, nullptr)), serial_(other.serial_) {}
-  IpcReply& operator=(IpcReply&&) = delete;
+  IpcReply(const IpcReply&) = delete;
+  IpcReply& operator=(const IpcReply&) = delete;
   [[nodiscard]] explicit operator bool() const noexcept { return connection_ != nullptr; }
   /// Sends a value (or none) and an error (or null); further calls do nothing. A reply that memory does not suffice
   /// for closes the connection. On the thread that runs the operation.
@@ -43,11 +52,16 @@ class IpcReply {
   std::uint64_t serial_;
 };
 
-/// One operation of an interface. `invoke` is given the exported object, the call's argument (none when it has none)
-/// and the reply.
+/// What an operation is given beside the exported object.
+struct IpcCall {
+  const PropertyValue& argument;  ///< none when the call has none
+  IpcCaller caller;
+};
+
+/// One operation of an interface.
 struct IpcOperation {
   std::string_view name;
-  void (*invoke)(void* object, const PropertyValue& argument, IpcReply reply) noexcept;
+  void (*invoke)(void* object, const IpcCall& call, IpcReply& reply) noexcept;
 };
 
 struct IpcInterface {

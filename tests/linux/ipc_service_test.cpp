@@ -11,6 +11,7 @@
 namespace quorvel::test {
 namespace {
 
+using platform::IpcCall;
 using platform::IpcError;
 using platform::IpcReply;
 using wire::FrameKind;
@@ -21,20 +22,21 @@ constexpr std::size_t kLargeSize = 8u << 20;
 std::atomic<int> calls_of_silent = 0;
 std::atomic<int> callers_of_meet = 0;
 
-void echo(void*, const PropertyValue& argument, IpcReply reply) noexcept {
-  reply.send(argument, nullptr);
-  reply.send(argument, nullptr);  // one too many, which nobody may notice
+void echo(void*, const IpcCall& call, IpcReply& reply) noexcept {
+  if (call.caller.user != ::getuid() || call.caller.process != ::getpid()) return;
+  reply.send(call.argument, nullptr);
+  reply.send(call.argument, nullptr);  // one too many, which nobody may notice
 }
-void fail(void*, const PropertyValue&, IpcReply reply) noexcept {
+void fail(void*, const IpcCall&, IpcReply& reply) noexcept {
   const IpcError error = {-7, "it failed"};
   reply.send(nullptr, &error);
 }
-void silent(void*, const PropertyValue&, IpcReply) noexcept { ++calls_of_silent; }
-void large(void* text, const PropertyValue&, IpcReply reply) noexcept {
+void silent(void*, const IpcCall&, IpcReply&) noexcept { ++calls_of_silent; }
+void large(void* text, const IpcCall&, IpcReply& reply) noexcept {
   reply.send(*static_cast<const PropertyValue*>(text), nullptr);
 }
 // Answers only while another call of it runs.
-void meet(void*, const PropertyValue&, IpcReply reply) noexcept {
+void meet(void*, const IpcCall&, IpcReply& reply) noexcept {
   ++callers_of_meet;
   if (eventually([] { return callers_of_meet >= 2; }, 5s)) reply.send(nullptr, nullptr);
 }

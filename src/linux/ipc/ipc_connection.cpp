@@ -88,7 +88,7 @@ void IpcConnection::run_call(const wire::Frame& frame, host::IpcOutgoing& outgoi
     const IpcError error = {wire::kRefusedArgument, "the argument is not a binary property list"};
     answer.send(nullptr, &error);
   } else {
-    operation->invoke(object_, argument, std::move(answer));
+    operation->invoke(object_, {argument, {peer_.user, peer_.process}}, answer);
   }
   outgoing_ = nullptr;
 }
