@@ -14,22 +14,19 @@ constexpr std::size_t kReadSize = 64u << 10;
 }  // namespace
 
 bool Peer::receive() {
-  received_.consume(taken_);
-  taken_ = 0;
-  if (received_.empty()) received_.clear(kReadSize);
-  std::byte bytes[kReadSize];
-  const ssize_t count = ::recv(connection_.get(), bytes, sizeof bytes, 0);
+  const std::span<std::byte> room = received_.room(kReadSize, kReadSize);
+  if (room.empty()) return false;
+  const ssize_t count = ::recv(connection_.get(), room.data(), room.size(), 0);
   if (count < 0) return errno == EAGAIN || errno == EINTR;
   if (count == 0) ended_ = true;
-  return received_.append(bytes, static_cast<std::size_t>(count));
+  received_.arrived(static_cast<std::size_t>(count));
+  return true;
 }
 
 wire::FrameResult Peer::next_call(wire::Frame& frame) noexcept {
-  const wire::FrameResult result = wire::parse_frame(received_.bytes().subspan(taken_), wire::kMaximumStateBody, frame);
+  const wire::FrameResult result = received_.next(wire::kMaximumStateBody, frame);
   if (result != wire::FrameResult::complete) return result;
-  if (frame.head.kind != wire::FrameKind::call) return wire::FrameResult::refused;
-  taken_ += wire::kFrameHeadSize + frame.head.body_length;
-  return result;
+  return frame.head.kind == wire::FrameKind::call ? result : wire::FrameResult::refused;
 }
 
 bool Peer::send(SharedFrame frame) {

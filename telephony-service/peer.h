@@ -9,7 +9,7 @@
 
 #include "platform/descriptor.h"
 #include "telephony-service/state_frames.h"
-#include "wire/frame.h"
+#include "wire/frame_input.h"
 
 namespace quorvel::telephony {
 
@@ -57,8 +57,7 @@ class Peer {
 
   Descriptor connection_;
   bool ended_ = false;
-  ByteBuffer received_;
-  std::size_t taken_ = 0;
+  wire::FrameInput received_;
   std::deque<SharedFrame> waiting_;
   std::size_t sent_of_first_ = 0;
   std::size_t waiting_bytes_ = 0;

@@ -81,29 +81,26 @@ Progress Connection::send(Failure& failure) noexcept {
 }
 
 Progress Connection::receive(Failure& failure) noexcept {
-  received_.consume(std::exchange(taken_, 0));
-  if (received_.empty()) received_.clear(kKeptCapacity);
-  const std::size_t before = received_.size();
-  if (received_.capacity() - before < kLeastRead &&
-      !received_.reserve(std::max(before + kLeastRead, received_.capacity() * 2))) {
+  std::span<std::byte> room = received_.room(kLeastRead, kKeptCapacity);
+  if (room.empty()) {
     set_failure(failure, ErrorCode::system_failure, {"Memory does not suffice for what the service sends."});
     return Progress::failed;
   }
-  const std::size_t room = std::min(received_.capacity() - before, kMostRead);
+  room = room.first(std::min(room.size(), kMostRead));
   ssize_t count;
   do {
-    count = ::recv(socket_.descriptor(), received_.data() + before, room, 0);
+    count = ::recv(socket_.descriptor(), room.data(), room.size(), 0);
   } while (count < 0 && errno == EINTR);
   if (count < 0 && errno == EAGAIN) return Progress::waiting;
-  if (count > 0 && received_.resize(before + static_cast<std::size_t>(count))) return Progress::done;
-  return connection_failed(count == 0 ? EPIPE : errno, failure);
+  if (count <= 0) return connection_failed(count == 0 ? EPIPE : errno, failure);
+  received_.arrived(static_cast<std::size_t>(count));
+  return Progress::done;
 }
 
 Progress Connection::take_frame(wire::Frame& frame, Failure& failure) noexcept {
-  switch (wire::parse_frame(received_.bytes().subspan(taken_), maximum_body_, frame)) {
+  switch (received_.next(maximum_body_, frame)) {
     case wire::FrameResult::complete:
-      taken_ += wire::kFrameHeadSize + frame.head.body_length;
-      note_what_is_left();
+      frame_is_left_ = received_.look(maximum_body_) != wire::FrameResult::incomplete;
       return Progress::done;
     case wire::FrameResult::incomplete: return Progress::waiting;
     case wire::FrameResult::refused: break;
@@ -111,12 +108,6 @@ Progress Connection::take_frame(wire::Frame& frame, Failure& failure) noexcept {
   set_failure(failure, ErrorCode::protocol_error,
               {"The service sent bytes that are no frame, or a frame above the limit."});
   return Progress::failed;
-}
-
-void Connection::note_what_is_left() noexcept {
-  wire::Frame next;
-  const std::span<const std::byte> left = received_.bytes().subspan(taken_);
-  frame_is_left_ = wire::parse_frame(left, maximum_body_, next) != wire::FrameResult::incomplete;
 }
 
 }  // namespace quorvel::client

@@ -5,7 +5,7 @@
 #include <cstdint>
 
 #include "client/core/service_socket.h"
-#include "wire/frame.h"
+#include "wire/frame_input.h"
 
 namespace quorvel::client {
 
@@ -32,16 +32,15 @@ class Connection {
   [[nodiscard]] Progress send(Failure& failure) noexcept;
   [[nodiscard]] Progress receive(Failure& failure) noexcept;
   [[nodiscard]] Progress take_frame(wire::Frame& frame, Failure& failure) noexcept;
-  void note_what_is_left() noexcept;
 
   ServiceSocket socket_;
   State state_ = State::connecting;
   Moment try_again_ = 0;
   ByteBuffer request_;
   std::size_t sent_ = 0;
-  ByteBuffer received_;
-  std::size_t taken_ = 0;       // bytes of `received_` that belong to frames handed out
-  bool frame_is_left_ = false;  // behind them, there is a whole frame, or bytes that can be none
+  wire::FrameInput received_;
+  bool frame_is_left_ =
+      false;  // behind the frame that was handed out, there is a whole frame, or bytes that can be none
   std::uint32_t maximum_body_ = 0;
 };
 

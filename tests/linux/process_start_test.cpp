@@ -30,7 +30,8 @@ TEST(ProcessStart, RefusesARootThatIsNoDirectory) {
   for (const std::string& value :
        {std::string(), std::string("relative"), root.path("/file").string(), root.path("/missing").string()}) {
     ::setenv("QUORVEL_ROOT", value.c_str(), 1);
-    EXPECT_START(78, "^quorveld: QUORVEL_ROOT must be the absolute path of a directory: [^\n]*\n$") << value;
+    EXPECT_START(78, "^quorveld: QUORVEL_ROOT must be the absolute path of a directory, which \"" + value +
+                         "\" is not: [^\n]*\n$");
   }
 }
 
@@ -107,7 +108,7 @@ TEST(ProcessStart, RefusesASecondInstance) {
   root.make_directory("/run/quorvel");
   {
     const Descriptor live = listen_on(kSocket);
-    EXPECT_START(69, "^quorveld: another process serves com.example.service.sock\n$");
+    EXPECT_START(69, "^quorveld: another process serves /run/quorvel/com.example.service.sock\n$");
     EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
   }
   EXPECT_START(0, "^$") << "the socket is stale now";

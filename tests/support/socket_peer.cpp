@@ -42,22 +42,20 @@ void SocketPeer::end_sending() { ::shutdown(descriptor(), SHUT_WR); }
 
 bool SocketPeer::read_more(std::chrono::milliseconds patience) {
   if (!wait_for(descriptor(), POLLIN, patience)) return false;
-  char bytes[65536];
-  const ssize_t count = ::recv(descriptor(), bytes, sizeof bytes, MSG_DONTWAIT);
-  if (count > 0) input_.append(bytes, static_cast<std::size_t>(count));
+  const std::span<std::byte> room = input_.room(65536, SIZE_MAX);
+  const ssize_t count = ::recv(descriptor(), room.data(), room.size(), MSG_DONTWAIT);
+  if (count > 0) input_.arrived(static_cast<std::size_t>(count));
   return count > 0;
 }
 
 std::optional<ReceivedFrame> SocketPeer::receive(std::chrono::milliseconds patience) {
   for (;;) {
     wire::Frame frame;
-    const std::span<const std::byte> bytes(reinterpret_cast<const std::byte*>(input_.data()), input_.size());
-    const wire::FrameResult result = wire::parse_frame(bytes, UINT32_MAX, frame);
+    const wire::FrameResult result = input_.next(UINT32_MAX, frame);
     if (result == wire::FrameResult::refused) throw std::runtime_error("a frame that is none");
     if (result == wire::FrameResult::complete) {
       ReceivedFrame received{frame.head.kind, frame.head.serial, std::string(frame.name), nullptr};
       if (!frame.payload.empty()) received.value = read_binary(frame.payload, Mutability::immutable);
-      input_.erase(0, wire::kFrameHeadSize + frame.head.body_length);
       return received;
     }
     if (!read_more(patience)) return std::nullopt;
@@ -65,7 +63,7 @@ std::optional<ReceivedFrame> SocketPeer::receive(std::chrono::milliseconds patie
 }
 
 bool SocketPeer::is_closed(std::chrono::milliseconds patience) {
-  if (!input_.empty() || !wait_for(descriptor(), POLLIN, patience)) return false;
+  if (input_.look(UINT32_MAX) == wire::FrameResult::complete || !wait_for(descriptor(), POLLIN, patience)) return false;
   char byte;
   const ssize_t count = ::recv(descriptor(), &byte, 1, MSG_DONTWAIT);
   return count == 0 || (count < 0 && errno == ECONNRESET);

@@ -3,7 +3,7 @@
 
 #include "platform/descriptor.h"
 #include "support/watching.h"
-#include "wire/frame.h"
+#include "wire/frame_input.h"
 
 namespace quorvel::test {
 
@@ -38,7 +38,7 @@ class SocketPeer {
   [[nodiscard]] bool read_more(std::chrono::milliseconds patience);
 
   Descriptor socket_;
-  std::string input_;
+  wire::FrameInput input_;
 };
 
 /// A listening socket in the service directory, for playing a service.

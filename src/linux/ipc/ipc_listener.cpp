@@ -41,7 +41,7 @@ int IpcListener::open_socket() noexcept {
   socket_ = host::ListeningSocket::open(socket_name_);
   if (socket_) return 0;
   if (errno == EADDRINUSE) {
-    host::print_error_line("another process serves %s", socket_name_);
+    host::print_error_line("another process serves %s/%s", wire::kServiceDirectory.data(), socket_name_);
     return EX_UNAVAILABLE;
   }
   host::print_system_error("cannot listen on %s/%s", wire::kServiceDirectory.data(), socket_name_);

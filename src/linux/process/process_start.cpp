@@ -10,6 +10,7 @@
 #include <climits>
 #include <csignal>
 #include <cstdio>
+#include <cstdlib>
 
 #include "linux/base/device_root.h"
 #include "linux/base/error_line.h"
@@ -66,6 +67,25 @@ void ignore_fatal_signals() noexcept {
   return false;
 }
 
+// 0, or after a line on standard error the exit status to end with.
+[[nodiscard]] int settle_root() noexcept {
+  if (::access("/proc/self/fd", X_OK) != 0) {
+    host::print_system_error("/proc/self/fd, which every path is checked with, cannot be used");
+    return EX_OSERR;
+  }
+  const host::DeviceRoot& root = host::device_root();
+  if (root.error == 0) return 0;
+  if (root.error == ENOSYS) {
+    host::print_error_line("QUORVEL_ROOT needs Linux 5.6 or later; unset, quorveld runs on this one as well");
+  } else {
+    errno = root.error;
+    const char* value = std::getenv("QUORVEL_ROOT");
+    host::print_system_error("QUORVEL_ROOT must be the absolute path of a directory, which \"%s\" is not",
+                             value != nullptr ? value : "/");
+  }
+  return EX_CONFIG;
+}
+
 // A large file or reply takes its memory back to the system with it. The allocator would otherwise learn from the first
 // one to keep such memory, in every thread.
 void bound_idle_memory() noexcept {
@@ -80,7 +100,7 @@ void bound_idle_memory() noexcept {
   const int length = std::snprintf(name, sizeof name, "%.*s%s", static_cast<int>(service_name.size()),
                                    service_name.data(), wire::kSocketSuffix.data());
   if (length < 0 || !host::is_served(name)) return 0;
-  host::print_error_line("another process serves %s", name);
+  host::print_error_line("another process serves %s/%s", wire::kServiceDirectory.data(), name);
   return EX_UNAVAILABLE;
 }
 
@@ -88,28 +108,20 @@ void bound_idle_memory() noexcept {
 
 int start_process(std::string_view service_name) noexcept {
   host::settle_passed_sockets();
+  ignore_fatal_signals();
   if (!fill_standard_descriptors()) {
     host::print_system_error("cannot open /dev/null");
     return EX_OSERR;
   }
-  const host::DeviceRoot& root = host::device_root();
-  if (root.error == ENOSYS) {
-    host::print_error_line("QUORVEL_ROOT needs Linux 5.6 or later; unset, quorveld runs on this one as well");
-    return EX_CONFIG;
-  }
-  if (root.error != 0) {
-    errno = root.error;
-    host::print_system_error("QUORVEL_ROOT must be the absolute path of a directory");
-    return EX_CONFIG;
-  }
-  ignore_fatal_signals();
-  ::umask(022);
-  if (!has_enough_descriptors()) return EX_OSERR;
-  bound_idle_memory();
+  // From here on a signal that ends the daemon waits until the run loop takes it.
   if (!main_run_loop()->open()) {
     host::print_system_error("cannot make the run loop");
     return EX_OSERR;
   }
+  if (const int status = settle_root(); status != 0) return status;
+  ::umask(022);
+  if (!has_enough_descriptors()) return EX_OSERR;
+  bound_idle_memory();
   // The socket is asked about first: the lock of another user's instance cannot even be opened.
   int status = refuse_served_socket(service_name);
   if (status == 0) status = host::take_instance_lock();

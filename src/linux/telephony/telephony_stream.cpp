@@ -4,7 +4,6 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <string_view>
@@ -88,21 +87,19 @@ void TelephonyStream::tell_unusable(const wire::Frame& frame) const noexcept {
 
 void TelephonyStream::close() noexcept {
   socket_ = Descriptor();
-  input_ = ByteBuffer();
-  taken_ = 0;
+  input_.clear();
 }
 
 TelephonyStream::Result TelephonyStream::next(wire::Frame& frame) noexcept {
   const Result buffered = take_frame(frame);
   if (buffered != Result::nothing) return buffered;
-  drop_taken();
   const Result received = receive();
   return received == Result::frame ? take_frame(frame) : received;
 }
 
 TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept {
-  switch (wire::parse_frame(input_.bytes().subspan(taken_), wire::kMaximumStateBody, frame)) {
-    case wire::FrameResult::complete: taken_ += wire::kFrameHeadSize + frame.head.body_length; return Result::frame;
+  switch (input_.next(wire::kMaximumStateBody, frame)) {
+    case wire::FrameResult::complete: return Result::frame;
     case wire::FrameResult::incomplete: return Result::nothing;
     case wire::FrameResult::refused: break;
   }
@@ -116,22 +113,13 @@ TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept
   return Result::gone;
 }
 
-// Room for one large frame is not kept for the small ones that usually follow.
-void TelephonyStream::drop_taken() noexcept {
-  input_.consume(taken_);
-  taken_ = 0;
-  if (input_.empty()) input_.clear(2 * kReceiveSize);
-}
-
-// `frame` here says that bytes came. The room follows what has arrived, never what a head announces.
+// `frame` here says that bytes came. Room for one large frame is not kept for the small ones that usually follow.
 TelephonyStream::Result TelephonyStream::receive() noexcept {
-  const std::size_t size = input_.size();
-  const std::size_t needed = size + kReceiveSize;
-  if (!input_.reserve(needed <= input_.capacity() ? needed : std::max(needed, 2 * size))) return Result::gone;
-  static_cast<void>(input_.resize(needed));
-  const ssize_t count = ::recv(descriptor(), input_.data() + size, kReceiveSize, MSG_DONTWAIT);
+  const std::span<std::byte> room = input_.room(kReceiveSize, 2 * kReceiveSize);
+  if (room.empty()) return Result::gone;
+  const ssize_t count = ::recv(descriptor(), room.data(), room.size(), MSG_DONTWAIT);
   const int error = errno;
-  static_cast<void>(input_.resize(size + static_cast<std::size_t>(std::max<ssize_t>(count, 0))));
+  if (count > 0) input_.arrived(static_cast<std::size_t>(count));
   if (count > 0) return Result::frame;
   if (count < 0 && (error == EAGAIN || error == EINTR)) return Result::nothing;
   if (should_tell(TelephonyTrouble::loss, count == 0 ? 0 : error)) {

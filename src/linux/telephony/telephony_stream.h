@@ -4,11 +4,8 @@
 
 #include <sys/types.h>
 
-#include <cstddef>
-
 #include "platform/descriptor.h"
-#include "property/byte_buffer.h"
-#include "wire/frame.h"
+#include "wire/frame_input.h"
 
 namespace quorvel::platform::host {
 
@@ -38,13 +35,11 @@ class TelephonyStream {
   [[nodiscard]] bool is_trusted(int directory, int socket) noexcept;
   [[nodiscard]] Result take_frame(wire::Frame& frame) noexcept;
   [[nodiscard]] Result receive() noexcept;
-  void drop_taken() noexcept;
 
   Descriptor socket_;
   pid_t process_ = 0;  // who listens, for the texts
   uid_t user_ = 0;
-  ByteBuffer input_;
-  std::size_t taken_ = 0;  // how much of the input has been handed out
+  wire::FrameInput input_;
 };
 
 }  // namespace quorvel::platform::host
