@@ -88,7 +88,8 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] const PropertyValue& at(std::size_t index) const noexcept;
   /// The value under `key` of a dictionary, borrowed; no value when there is none.
   [[nodiscard]] const PropertyValue& get(const HashedKey& key) const noexcept;
-  /// The entry under `key` of a dictionary, borrowed; two times no value when there is none.
+  /// The entry under `key` of a dictionary, borrowed; a key and a value that are none when there is no such
+  /// entry.
   [[nodiscard]] DictionaryEntry find(const HashedKey& key) const noexcept;
   /// The entries of a dictionary in their order: that of the file it came from, then as they were added.
   [[nodiscard]] DictionaryRange entries() const noexcept;
@@ -99,7 +100,8 @@ class [[nodiscard]] PropertyValue {
   [[nodiscard]] bool set(const HashedKey& key, PropertyValue value) noexcept;
   /// Adds an entry under a key that is known not to be there; false as for `set`. The key's text must be valid UTF-8.
   [[nodiscard]] bool add(const HashedKey& key, PropertyValue value) noexcept;
-  /// The same with `shared`, a string equal to `key` that others hold as well, as the entry's key; none to make one.
+  /// The same, but the entry's key is `shared`, a string equal to `key` that others hold as well. Without one, a string
+  /// is made.
   [[nodiscard]] bool add(const HashedKey& key, PropertyValue shared, PropertyValue value) noexcept;
   /// Takes the entry out and returns its value; none when there was none, this is no mutable dictionary, or the copy
   /// that a shared dictionary needs first could not be made.
@@ -117,7 +119,7 @@ class [[nodiscard]] PropertyValue {
   /// kind and when memory runs out.
   [[nodiscard]] PropertyValue mutable_copy() const noexcept;
 
-  /// For the codec and the property room: the word itself, and a value that takes over the word's reference.
+  /// For this folder and the encoding: the word itself, and a value that takes over the word's reference.
   [[nodiscard]] detail::Word word() const noexcept { return word_; }
   [[nodiscard]] static PropertyValue adopt(detail::Word word) noexcept {
     PropertyValue value;
@@ -185,7 +187,7 @@ class DictionaryRange {
 
 /// Deep equality. Kinds must match (an integer never equals a real), reals and dates compare bit by bit, so that a NaN
 /// equals itself and 0.0 differs from -0.0; the order of a dictionary's entries does not count. False also when the
-/// values are nested deeper or fan out further than `Limits` allows.
+/// values are nested deeper or fan out further than limits.h allows.
 [[nodiscard]] bool operator==(const PropertyValue& left, const PropertyValue& right) noexcept;
 
 /// A text that lives as long as the process, made when the program is compiled: a name that many places share. Its

@@ -109,8 +109,8 @@ class BinaryLayout {
 };
 
 // Done for containers and whatever else is no short leaf. Whether a size is long is hard to predict, so that the common
-// form of a long one, a single byte behind an integer's marker, is read without a branch; behind the objects there are
-// more than two bytes.
+// form of a long one, a single byte behind an integer's marker, is read without a branch; the two bytes behind the last
+// object can be read, because the trailer follows.
 inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object) const noexcept {
   const std::byte* at = marker_at(offset);
   if (at == nullptr) return false;

@@ -26,7 +26,7 @@ inline constexpr std::size_t kLeafRoom = 72;
   return is_node(word) ? kLeafRoom + std::size_t{bytes_of(word)->length} * 2 : kLeafRoom;
 }
 
-// What is written without a branch may reach beyond the leaf: it is overwritten by what comes next.
+// A leaf that is put without a branch may write beyond its end: the next object, or the offset table, overwrites that.
 
 /// The width of the smallest integer that holds `bits`, as a power of two.
 [[nodiscard]] inline unsigned width_exponent(std::uint64_t bits) noexcept {

@@ -17,7 +17,8 @@ class OmittedEntries {
   OmittedEntries& operator=(const OmittedEntries&) = delete;
   ~OmittedEntries() { std::free(bits_); }
 
-  /// Adds the entry of `dictionary`, the same each time, under `key`, if there is one. False when memory runs out.
+  /// Adds the entry under `key`, if there is one; `dictionary` must be the same in all calls. False when memory runs
+  /// out.
   [[nodiscard]] bool add(const PropertyValue& dictionary, const HashedKey& key) noexcept;
 
   [[nodiscard]] std::size_t count() const noexcept { return count_; }

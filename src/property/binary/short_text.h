@@ -1,6 +1,6 @@
-// Work on the bytes of short texts. Lengths vary from text to text, so that a branch on one is mispredicted: what is
-// common is done without any, sixteen bytes at a time, overlapping. What depends on a length stands in tables, because
-// compilers make branches of comparisons.
+// Work on the bytes of short texts, sixteen at a time, in chunks that overlap. Lengths vary from text to text, so that
+// a branch on a length is mispredicted; whatever depends on one stands in a table, because compilers make branches of
+// comparisons.
 #pragma once
 
 #include <algorithm>

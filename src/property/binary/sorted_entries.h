@@ -13,7 +13,8 @@ namespace quorvel::detail {
 class SortedEntries {
  public:
   /// Tests false when memory runs out. The dictionary, which keeps the order it was found to have, may not change or
-  /// end meanwhile. Of `omitted` entries, where they are given, there are none. Any thread.
+  /// end meanwhile. The entries in `omitted`, where it is given, are left out. Any
+  /// thread.
   explicit SortedEntries(const DictionaryNode& dictionary, const OmittedEntries* omitted = nullptr) noexcept;
   SortedEntries(const SortedEntries&) = delete;
   SortedEntries& operator=(const SortedEntries&) = delete;

@@ -3,13 +3,13 @@
 // a reference has to be guessed; when the guess turns out wrong, the value is written anew with the right one.
 
 #include <algorithm>
-#include <cstdlib>
 #include <cstring>
 
 #include "property/binary/binary.h"
-#include "property/binary/leaf_table.h"
+#include "property/binary/element_rows.h"
+#include "property/binary/leaf_numbers.h"
 #include "property/binary/leaf_writer.h"
-#include "property/binary/sorted_entries.h"
+#include "property/growing_row.h"
 #include "property/walk.h"
 
 namespace quorvel {
@@ -24,74 +24,10 @@ constexpr std::size_t kLargestFile = UINT32_MAX;
 constexpr std::size_t kMaximumObjects = 0xffff'fffe;
 constexpr std::size_t kLargestReference = 4;
 
-// Looking every leaf up, to store equal ones once, costs more than all the rest of the writing, so it is done where
-// leaves repeat: each leaf that is looked up spends one from a credit, and each that was there before earns some. A
-// container with more than `kCredit` elements starts with a full one, so that whatever stands in a small file is looked
-// up.
-constexpr std::uint32_t kCredit = 256;
-constexpr std::uint32_t kEarned = 4;
-constexpr std::uint32_t kMaximumCredit = 4096;
-
-// In ascending order of their keys, entries lie anywhere in memory: what is needed so many entries later is fetched
-// meanwhile.
-constexpr std::size_t kFetchAhead = 16;
-
 // The room that an element takes in common files; a wrong guess costs another allocation. No more than so much is asked
 // for on a guess: what many small elements do not need must not be what memory runs out for.
 constexpr std::size_t kLikelyElementRoom = 72;
 constexpr std::size_t kLargestGuess = std::size_t{4} << 20;
-
-inline void fetch(Word word) noexcept {
-  if (is_node(word)) __builtin_prefetch(node_of(word));
-}
-
-void fetch_elements(const ContainerNode& container) noexcept {
-  const auto* words = static_cast<const Word*>(container.storage);
-  const std::size_t count = container.kind == PropertyKind::dictionary ? container.used * 2 : container.used;
-  for (std::size_t i = 0; i < std::min(count, kFetchAhead); ++i) fetch(words[i]);
-}
-
-// Entries that were removed do not count: equal values give equal bytes.
-std::size_t element_count(const ContainerNode& container) noexcept {
-  return container.kind == PropertyKind::dictionary ? static_cast<const DictionaryNode&>(container).live
-                                                    : container.used;
-}
-
-// The keys, or the values, of a dictionary in their order.
-template <Word Entry::*part>
-class EntryRow {
- public:
-  static constexpr bool kHasOnlyTexts = part == &Entry::key;
-  explicit EntryRow(const SortedEntries& sorted) noexcept
-      : entries_(sorted.entries()), order_(sorted.order()), size_(sorted.size()) {}
-  [[nodiscard]] std::size_t size() const noexcept { return size_; }
-  [[nodiscard]] Word operator[](std::size_t index) const noexcept {
-    const std::size_t ahead = index + kFetchAhead < size_ ? index + kFetchAhead : index;
-    if (order_ == nullptr) {
-      __builtin_prefetch(node_of(entries_[ahead].*part));
-      return entries_[index].*part;
-    }
-    __builtin_prefetch(node_of(entries_[order_[ahead]].*part));
-    return entries_[order_[index]].*part;
-  }
-
- private:
-  const Entry* entries_;
-  const std::uint32_t* order_;
-  std::size_t size_;
-};
-
-// The elements of an array.
-class ElementRow {
- public:
-  static constexpr bool kHasOnlyTexts = false;
-  explicit ElementRow(const ArrayNode& array) noexcept : array_(array) {}
-  [[nodiscard]] std::size_t size() const noexcept { return array_.used; }
-  [[nodiscard]] Word operator[](std::size_t index) const noexcept { return array_.items()[index]; }
-
- private:
-  const ArrayNode& array_;
-};
 
 // Puts the objects of one value behind what the buffer holds. Every function that takes `at`, where the next byte goes,
 // returns where it ended, or null when it failed.
@@ -106,10 +42,6 @@ class Writer {
         maximum_count_(std::min(kMaximumObjects, std::size_t{1} << (8 * reference_size))) {}
   Writer(const Writer&) = delete;
   Writer& operator=(const Writer&) = delete;
-  ~Writer() {
-    std::free(offsets_);
-    std::free(queue_);
-  }
 
   /// False when the value breaks a bound, memory runs out, or there are more objects than references can tell.
   [[nodiscard]] bool put_objects() noexcept;
@@ -128,12 +60,12 @@ class Writer {
   std::byte* put_container(std::byte* at, Word word) noexcept;
   std::byte* put_new_leaf(std::byte* at, Word word) noexcept;
   std::byte* add_boolean(std::byte* at, Word word) noexcept;
-  std::byte* add_leaf(std::byte* at, Word word, std::uint32_t& credit) noexcept;
-  std::byte* add_value(std::byte* at, Word word, std::uint32_t& credit) noexcept;
+  std::byte* add_leaf(std::byte* at, Word word, Credit& credit) noexcept;
+  std::byte* add_value(std::byte* at, Word word, Credit& credit) noexcept;
   template <class Row>
   std::byte* add_short_leaves(std::byte* at, std::size_t& first, Row row) noexcept;
   template <class Row>
-  std::byte* add_row(std::byte* at, const Row& row, std::uint32_t& credit) noexcept;
+  std::byte* add_row(std::byte* at, const Row& row, Credit& credit) noexcept;
   std::byte* add_elements(std::byte* at, const ContainerNode& container) noexcept;
   std::byte* add_dictionary(std::byte* at, const DictionaryNode& dictionary) noexcept;
   std::byte* add_array(std::byte* at, const ArrayNode& array) noexcept;
@@ -141,7 +73,6 @@ class Writer {
 
   [[nodiscard]] bool number_next(const std::byte* at) noexcept;
   [[nodiscard]] bool grow_offsets() noexcept;
-  [[nodiscard]] bool enqueue(const Queued& queued) noexcept;
   std::byte* make_room(std::byte* at, std::size_t room) noexcept {
     return static_cast<std::size_t>(end_ - at) >= room ? at : grow(at, room);
   }
@@ -158,30 +89,16 @@ class Writer {
   std::byte* start_ = nullptr;
   std::byte* end_ = nullptr;  // of the room
   std::size_t body_end_ = 0;
-  std::uint32_t* offsets_ = nullptr;
-  std::size_t count_ = 0;  // objects so far
-  std::size_t offsets_room_ = 0;
-  Queued* queue_ = nullptr;
-  std::size_t queued_ = 0;
-  std::size_t queue_room_ = 0;
-  LeafTable leaves_;
-  std::uint32_t booleans_[2] = {};  // the numbers of false and true; 0, which is the top object's, for none
+  GrowingRow<std::uint32_t> offsets_;  // by the objects' numbers; filled by hand up to `count_`
+  std::size_t count_ = 0;
+  GrowingRow<Queued> queue_;
+  LeafNumbers numbers_;
   bool fan_checked_ = false;
   bool has_too_many_ = false;
 
   std::size_t next_reference_ = 0;  // where it goes
-  std::uint32_t key_credit_ = kCredit;
-  std::uint32_t value_credit_ = kCredit;
+  Credit key_credit_, value_credit_;
 };
-
-template <class T>
-bool grow_row(T*& row, std::size_t& room, std::size_t larger) noexcept {
-  void* grown = std::realloc(row, larger * sizeof(T));
-  if (grown == nullptr) return false;
-  row = static_cast<T*>(grown);
-  room = larger;
-  return true;
-}
 
 std::byte* Writer::grow(std::byte* at, std::size_t room) noexcept {
   const std::size_t used = start_ == nullptr ? 0 : static_cast<std::size_t>(at - start_);
@@ -200,20 +117,12 @@ bool Writer::grow_offsets() noexcept {
     has_too_many_ = true;
     return false;
   }
-  const std::size_t likely = std::max({std::size_t{16}, offsets_room_ * 2, root_.size() * 2 + root_.size() / 4});
-  return grow_row(offsets_, offsets_room_, std::min(maximum_count_, likely));
-}
-
-bool Writer::enqueue(const Queued& queued) noexcept {
-  if (queued_ == queue_room_ && !grow_row(queue_, queue_room_, std::max<std::size_t>(16, queue_room_ * 2))) {
-    return false;
-  }
-  queue_[queued_++] = queued;
-  return true;
+  const std::size_t likely = std::max({std::size_t{16}, offsets_.room() * 2, root_.size() * 2 + root_.size() / 4});
+  return offsets_.reserve(std::min(maximum_count_, likely));
 }
 
 inline bool Writer::number_next(const std::byte* at) noexcept {
-  if (count_ == offsets_room_ && !grow_offsets()) return false;
+  if (count_ == offsets_.room() && !grow_offsets()) return false;
   offsets_[count_++] = static_cast<std::uint32_t>(at - start_);
   return true;
 }
@@ -236,14 +145,14 @@ std::byte* Writer::put_container(std::byte* at, Word word) noexcept {
     fan_checked_ = true;
     if (!is_within_limits(root_)) return nullptr;
   }
-  const ContainerNode* container = is_dictionary ? &dictionary_at(word) : static_cast<ContainerNode*>(node_of(word));
-  std::size_t size = is_dictionary ? static_cast<const DictionaryNode*>(container)->live : container->used;
+  const auto* container = static_cast<const ContainerNode*>(node_of(word));
+  std::size_t size = element_count(*container);
   if (count_ == 0) size -= omitted_.count();
   const std::size_t references = (is_dictionary ? 2 * size : size) * reference_size_;
   at = make_room(at, kLeafRoom + references);
   if (at == nullptr || !number_next(at)) return nullptr;
   at = put_marker(at, is_dictionary ? format::kDictionary : format::kArray, size);
-  if (!enqueue({container, static_cast<std::uint32_t>(at - start_)})) return nullptr;
+  if (!queue_.add({container, static_cast<std::uint32_t>(at - start_)})) return nullptr;
   return at + references;
 }
 
@@ -252,7 +161,7 @@ inline std::byte* Writer::put_object(std::byte* at, Word word) noexcept {
 }
 
 inline std::byte* Writer::add_boolean(std::byte* at, Word word) noexcept {
-  std::uint32_t& number = booleans_[word == kTrue ? 1 : 0];
+  std::uint32_t& number = numbers_.boolean(word == kTrue);
   const bool is_new = number == 0;
   if (is_new) number = static_cast<std::uint32_t>(count_);
   refer(number);
@@ -260,14 +169,11 @@ inline std::byte* Writer::add_boolean(std::byte* at, Word word) noexcept {
 }
 
 // Refers to a leaf that was put before, or puts it.
-inline std::byte* Writer::add_leaf(std::byte* at, Word word, std::uint32_t& credit) noexcept {
-  if (credit > 0) {
-    auto number = static_cast<std::uint32_t>(count_);
-    const LeafTable::Outcome outcome = leaves_.find_or_add(word, number);
-    if (outcome == LeafTable::Outcome::no_memory) return nullptr;
-    --credit;
-    if (outcome == LeafTable::Outcome::found) {
-      credit = std::min(credit + kEarned, kMaximumCredit);
+inline std::byte* Writer::add_leaf(std::byte* at, Word word, Credit& credit) noexcept {
+  if (credit.pays()) {
+    std::uint32_t number = 0;
+    if (!numbers_.find_or_add(word, static_cast<std::uint32_t>(count_), credit, number)) return nullptr;
+    if (number != count_) {
       refer(number);
       return at;
     }
@@ -276,7 +182,7 @@ inline std::byte* Writer::add_leaf(std::byte* at, Word word, std::uint32_t& cred
   return put_new_leaf(at, word);
 }
 
-std::byte* Writer::add_value(std::byte* at, Word word, std::uint32_t& credit) noexcept {
+std::byte* Writer::add_value(std::byte* at, Word word, Credit& credit) noexcept {
   if (!is_node(word)) {
     return kind_of(word) == PropertyKind::boolean ? add_boolean(at, word) : add_leaf(at, word, credit);
   }
@@ -285,21 +191,22 @@ std::byte* Writer::add_value(std::byte* at, Word word, std::uint32_t& credit) no
   return put_container(at, word);
 }
 
-// Refers to short leaves, one behind the other from element `first` on, and puts them; moves `first` to the first
-// element that is none, or for which there is no room. Their kinds cannot be foreseen, and a branch on one is
-// mispredicted: what is chosen here is chosen with masks, because compilers make branches of conditions.
+// Refers to short leaves from element `first` on and puts them; moves `first` to the first element that is no short
+// leaf, or for which there is no room. The kinds of elements cannot be foreseen, and a branch on one is mispredicted:
+// whatever depends on a kind is chosen with masks. A boolean that has its number already is put as well, but what is
+// put next overwrites it.
 template <class Row>
 std::byte* Writer::add_short_leaves(std::byte* at, std::size_t& first, const Row row) noexcept {
-  // Bytes that are written may be anything's, to the compiler: what it must not read again is copied.
+  // Stores of bytes may change any object that others can see: copies spare a reload after each.
   std::byte* const start = start_;
   const std::byte* const end = end_;
-  std::uint32_t* const offsets = offsets_;
+  std::uint32_t* const offsets = &offsets_[0];
   const std::size_t reference_size = reference_size_;
-  const std::uint32_t booleans[2] = {booleans_[0], booleans_[1]};
+  const std::uint32_t booleans[2] = {numbers_.boolean(false), numbers_.boolean(true)};
   std::byte* reference = start + next_reference_;
   std::size_t count = count_;
   std::size_t i = first;
-  const std::size_t last = std::min(row.size(), i + (offsets_room_ - count));
+  const std::size_t last = std::min(row.size(), i + (offsets_.room() - count));
   for (; i < last && static_cast<std::size_t>(end - at) >= kLeafRoom; ++i) {
     const Word word = row[i];
     std::size_t number = count, is_boolean = 0;
@@ -309,14 +216,15 @@ std::byte* Writer::add_short_leaves(std::byte* at, std::size_t& first, const Row
       at = put_short_leaf(at, *bytes_of(word));
     } else {
       const IntegerLeaf integer(word);
-      const Word is_immediate = 0 - (word & kImmediateBit);
-      const BytesNode& leaf = *bytes_of(word ^ ((word ^ word_of(&integer)) & is_immediate));
+      const Word is_immediate = mask_of(word & kImmediateBit);
+      const BytesNode& leaf = *bytes_of(select(is_immediate, word_of(&integer), word));
       if (!is_short_leaf(leaf)) break;
-      is_boolean = 0 - (word >> 1 & is_immediate & 1);
-      number = (count & ~is_boolean) | (booleans[word >> 3 & 1] & is_boolean);
+      static_assert((kBooleanTag ^ kIntegerTag) == 2, "the second bit tells booleans from integers");
+      is_boolean = mask_of(word >> 1 & is_immediate);
+      number = select(is_boolean, booleans[word >> kTagBits & 1], count);
       if (number == 0) break;
       offsets[count] = static_cast<std::uint32_t>(at - start);
-      count += 1 + is_boolean;
+      count += 1 + is_boolean;  // a mask with all bits set is -1
       at += static_cast<std::size_t>(put_short_leaf(at, leaf) - at) & ~is_boolean;
     }
     format::put_integer(reference, number, reference_size);
@@ -330,9 +238,9 @@ std::byte* Writer::add_short_leaves(std::byte* at, std::size_t& first, const Row
 
 // Elements that are looked up, and those that are no short leaves, are added one by one.
 template <class Row>
-std::byte* Writer::add_row(std::byte* at, const Row& row, std::uint32_t& credit) noexcept {
+std::byte* Writer::add_row(std::byte* at, const Row& row, Credit& credit) noexcept {
   for (std::size_t i = 0; i < row.size() && at != nullptr;) {
-    if (credit == 0) at = add_short_leaves(at, i, row);
+    if (!credit.pays()) at = add_short_leaves(at, i, row);
     if (i < row.size()) at = add_value(at, row[i++], credit);
   }
   return at;
@@ -343,8 +251,9 @@ std::byte* Writer::add_dictionary(std::byte* at, const DictionaryNode& dictionar
   const SortedEntries sorted(dictionary, is_top ? &omitted_ : nullptr);
   if (!sorted) return nullptr;
   // The keys of one dictionary differ: in a large one they are not looked up among each other.
-  std::uint32_t none = 0;
-  at = add_row(at, EntryRow<&Entry::key>(sorted), sorted.size() > kCredit ? none : key_credit_);
+  Credit none;
+  none.cancel();
+  at = add_row(at, EntryRow<&Entry::key>(sorted), sorted.size() > Credit::kFull ? none : key_credit_);
   return at == nullptr ? nullptr : add_row(at, EntryRow<&Entry::value>(sorted), value_credit_);
 }
 
@@ -368,14 +277,14 @@ bool Writer::put_objects() noexcept {
   if (at == nullptr) return false;
   at = put_object(put_header(at), root_.word());
   std::size_t level_end = 1, depth = 1;
-  for (std::size_t i = 0; i < queued_ && at != nullptr; ++i) {
+  for (std::size_t i = 0; i < queue_.size() && at != nullptr; ++i) {
     if (i == level_end) {
-      level_end = queued_;
+      level_end = queue_.size();
       if (++depth > kMaximumDepth) return false;
     }
-    if (i + 2 < queued_) fetch_elements(*queue_[i + 2].container);
+    if (i + 2 < queue_.size()) fetch_elements(*queue_[i + 2].container);
     next_reference_ = queue_[i].references;
-    if (element_count(*queue_[i].container) > kCredit) value_credit_ = std::max(value_credit_, kCredit);
+    if (element_count(*queue_[i].container) > Credit::kFull) value_credit_.refill();
     at = add_elements(at, *queue_[i].container);
   }
   if (at == nullptr) return false;
