@@ -49,7 +49,7 @@ constexpr int kMaximumPassedDescriptors = 1024;
 // The passed descriptor that clients are accepted from, or -1. Settled before the daemon opens anything of its own.
 constinit int passed_socket = -1;
 
-[[nodiscard]] bool send_to_manager(std::string_view socket_name, std::string_view message) noexcept {
+[[nodiscard]] bool send_to_manager(std::string_view socket_name, std::string_view message, int flags) noexcept {
   sockaddr_un address = {};
   address.sun_family = AF_UNIX;
   // An abstract name starts with a zero byte and ends where the address does, without one.
@@ -69,16 +69,17 @@ constinit int passed_socket = -1;
   ::setsockopt(socket.get(), SOL_SOCKET, SO_SNDTIMEO, &patience, sizeof patience);
   ssize_t sent = -1;
   do {
-    sent = ::sendto(socket.get(), message.data(), message.size(), MSG_NOSIGNAL,
+    sent = ::sendto(socket.get(), message.data(), message.size(), MSG_NOSIGNAL | flags,
                     reinterpret_cast<const sockaddr*>(&address), length);
   } while (sent < 0 && errno == EINTR);
   return sent >= 0;
 }
 
-void tell_manager(std::string_view message) noexcept {
+void tell_manager(std::string_view message, int flags) noexcept {
   const char* name = std::getenv("NOTIFY_SOCKET");
   if (name == nullptr || name[0] == '\0') return;
-  if (!send_to_manager(name, message)) host::print_system_error("cannot tell the service manager at %s", name);
+  if (!send_to_manager(name, message, flags) && errno != EAGAIN)
+    host::print_system_error("cannot tell the service manager at %s", name);
 }
 
 }  // namespace
@@ -112,9 +113,9 @@ void host::report_status(std::string_view text) noexcept {
   char message[256];
   text = text.substr(0, text.find('\n'));
   const int length = std::snprintf(message, sizeof message, "STATUS=%.*s", static_cast<int>(text.size()), text.data());
-  if (length > 0) tell_manager({message, std::min(static_cast<std::size_t>(length), sizeof message - 1)});
+  if (length > 0) tell_manager({message, std::min(static_cast<std::size_t>(length), sizeof message - 1)}, MSG_DONTWAIT);
 }
 
-void report_ready() noexcept { tell_manager("READY=1"); }
+void report_ready() noexcept { tell_manager("READY=1", 0); }
 
 }  // namespace quorvel::platform

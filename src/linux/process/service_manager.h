@@ -18,8 +18,8 @@ void settle_passed_sockets() noexcept;
 [[nodiscard]] Descriptor take_passed_socket() noexcept;
 
 /// Tells the service manager, if there is one, in one line what the daemon does; it is shown to whoever asks for the
-/// service's status, until the next text replaces it. About 240 bytes are shown, a line break ends the text. Main
-/// thread.
+/// service's status, until the next text replaces it. About 240 bytes are shown, a line break ends the text. A
+/// manager that is behind with its messages misses it. Main thread.
 void report_status(std::string_view text) noexcept;
 
 }  // namespace quorvel::platform::host

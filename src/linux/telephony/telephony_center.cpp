@@ -14,6 +14,7 @@
 
 #include "linux/base/error_line.h"
 #include "linux/base/local_socket.h"
+#include "linux/process/service_manager.h"
 #include "linux/telephony/telephony_trouble.h"
 #include "platform/device_paths.h"
 #include "platform/file_system.h"
@@ -93,8 +94,10 @@ void TelephonyCenter::serve_directory(void* context) noexcept {
 void TelephonyCenter::look_for_service() noexcept {
   switch (stream_.connect()) {
     case host::TelephonyStream::Connection::open: return watch_stream();
-    case host::TelephonyStream::Connection::busy: return schedule_try();
-    case host::TelephonyStream::Connection::absent: break;
+    case host::TelephonyStream::Connection::busy:
+      say("Listening; the telephony service cannot be followed: standard error says why");
+      return schedule_try();
+    case host::TelephonyStream::Connection::absent: say("Listening; waiting for the telephony service"); break;
   }
   if (directory_watch_ < 0) schedule_try();
 }
@@ -135,6 +138,7 @@ bool TelephonyCenter::handle(const wire::Frame& frame) noexcept {
   }
   state_ = std::move(state);
   delay_ = kFirstDelay;
+  say("Listening; following the telephony service");
   if (frame.head.kind == wire::FrameKind::event) deliver(frame.name);
   return true;
 }
@@ -151,7 +155,14 @@ void TelephonyCenter::lose_service() noexcept {
   loop_->remove(stream_source_);
   stream_.close();
   state_ = nullptr;
+  say("Listening; the telephony service is gone");
   schedule_try();
+}
+
+// What the service manager shows; told when it changes.
+void TelephonyCenter::say(const char* status) noexcept {
+  if (status != status_) host::report_status(status);
+  status_ = status;
 }
 
 void TelephonyCenter::schedule_try() noexcept {
@@ -176,7 +187,10 @@ TelephonyCenter* existing_telephony_center() noexcept { return the_center; }
 TelephonyCenter* default_telephony_center() noexcept {
   if (asked_before) return the_center;
   asked_before = true;
-  if (!Descriptor(open_file(paths::kTelephonyMark, O_PATH, 0)) && !host::TelephonyStream::has_place()) return nullptr;
+  if (!Descriptor(open_file(paths::kTelephonyMark, O_PATH, 0)) && !host::TelephonyStream::has_place()) {
+    host::report_status("Listening; this device has no telephony service");
+    return nullptr;
+  }
   the_center = new (std::nothrow) TelephonyCenter;
   if (the_center != nullptr && !the_center->start()) {
     delete the_center;

@@ -43,6 +43,7 @@ class TelephonyCenter {
   void look_for_service() noexcept;
   void watch_stream() noexcept;
   void lose_service() noexcept;
+  void say(const char* status) noexcept;
   void schedule_try() noexcept;
 
   host::TelephonyStream stream_;
@@ -53,7 +54,8 @@ class TelephonyCenter {
   RunLoopSource timer_source_;
   RunLoopSource directory_source_;
   RunLoop* loop_ = nullptr;
-  int delay_ = 0;  // milliseconds before the next attempt to connect
+  const char* status_ = nullptr;  // as the service manager was told last
+  int delay_ = 0;                 // milliseconds before the next attempt to connect
   PropertyValue state_;
   Observer* first_observer_ = nullptr;
   Observer** last_link_ = &first_observer_;
