@@ -119,29 +119,36 @@ inline constexpr DeviceQuestion kDeviceQuestions[] = {
 inline constexpr std::size_t kDeviceQuestionCount = std::size(kDeviceQuestions);
 static_assert(std::ranges::is_sorted(kDeviceQuestions, {}, &DeviceQuestion::name));
 
+/// The place of a question in the table, or kDeviceQuestionCount.
+[[nodiscard]] constexpr std::size_t find_question_place(std::string_view name) noexcept {
+  const auto row = std::ranges::lower_bound(kDeviceQuestions, name, {}, &DeviceQuestion::name);
+  const auto place = static_cast<std::size_t>(row - std::begin(kDeviceQuestions));
+  return place < kDeviceQuestionCount && row->name == name ? place : kDeviceQuestionCount;
+}
+
 /// The row of a question, or null.
 [[nodiscard]] constexpr const DeviceQuestion* find_device_question(std::string_view name) noexcept {
-  const DeviceQuestion* row = std::ranges::lower_bound(kDeviceQuestions, name, {}, &DeviceQuestion::name);
-  return row != std::end(kDeviceQuestions) && row->name == name ? row : nullptr;
+  const std::size_t place = find_question_place(name);
+  return place < kDeviceQuestionCount ? &kDeviceQuestions[place] : nullptr;
 }
 
 /// The name of a question of the table above; one that is not in it does not compile.
 class QuestionName {
  public:
   consteval QuestionName(std::string_view name)  // NOLINT(google-explicit-constructor): reads as the name it is
-      : row_(find_device_question(name)) {
-    if (row_ == nullptr) detail::refuse_to_compile("no question of the table has this name");
+      : place_(find_question_place(name)) {
+    if (place_ == kDeviceQuestionCount) detail::refuse_to_compile("no question of the table has this name");
   }
   consteval QuestionName(const char* name)  // NOLINT(google-explicit-constructor)
       : QuestionName(std::string_view(name)) {}
-  constexpr operator std::string_view() const noexcept { return row_->name; }  // NOLINT(google-explicit-constructor)
+  constexpr operator std::string_view() const noexcept {
+    return kDeviceQuestions[place_].name;
+  }  // NOLINT(google-explicit-constructor)
   /// The question's place in the table.
-  [[nodiscard]] constexpr std::size_t index() const noexcept {
-    return static_cast<std::size_t>(row_ - kDeviceQuestions);
-  }
+  [[nodiscard]] constexpr std::size_t index() const noexcept { return place_; }
 
  private:
-  const DeviceQuestion* row_;
+  std::size_t place_;
 };
 
 }  // namespace quorvel::platform
