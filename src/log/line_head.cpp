@@ -24,6 +24,8 @@ int format_stamp(time_t second, char* out, std::size_t room) noexcept {
   constexpr const char* kDays[] = {"Sun", "Mon", "Tue", "Wed", "Thu", "Fri", "Sat"};
   constexpr const char* kMonths[] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
                                      "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};
+  // The zone may have changed since the last second, on a device that travels.
+  tzset();
   struct tm local {};
   if (localtime_r(&second, &local) == nullptr) return std::snprintf(out, room, "@%lld", static_cast<long long>(second));
   return std::snprintf(out, room, "%s %s %2d %02d:%02d:%02d %lld", kDays[local.tm_wday], kMonths[local.tm_mon],
@@ -44,7 +46,7 @@ void make_head(time_t second) noexcept {
 
 std::string_view line_head() noexcept {
   const time_t now = time(nullptr);
-  if (now != head.second) make_head(now);
+  if (now != head.second || head.length == 0) make_head(now);
   return {head.text, head.length};
 }
 

@@ -1,13 +1,14 @@
 #include "log/trouble_report.h"
 
 #include <string.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <ctime>
+
+#include "platform/error_output.h"
 
 namespace quorvel {
 
@@ -18,7 +19,7 @@ constexpr time_t kInterval = 60;
 time_t last_report = 0;
 unsigned long suppressed = 0;
 
-// True when a report is due now.
+// True when a report is due now; the log lock guards both.
 bool is_due() noexcept {
   timespec now{};
   clock_gettime(CLOCK_MONOTONIC, &now);
@@ -30,38 +31,35 @@ bool is_due() noexcept {
   return true;
 }
 
-void write_report(char* text, int length, std::size_t room) noexcept {
-  auto used = std::min(static_cast<std::size_t>(std::max(length, 0)), room - 1);
-  if (suppressed > 0 && used < room - 1) {
-    used += static_cast<std::size_t>(
-        std::max(0, std::snprintf(text + used, room - used, " (and %lu more such failures)", suppressed)));
-    suppressed = 0;
-  }
-  used = std::min(used, room - 2);
-  text[used] = '\n';
-  // Standard error is a courtesy: nobody is told when it fails as well.
-  static_cast<void>(!write(STDERR_FILENO, text, used + 1));
-}
-
 }  // namespace
 
-void report_log_trouble(const char* what, const char* path) noexcept {
-  const int error = errno;
-  if (!is_due()) return;
-  char text[512];
-  const char* description = strerrordesc_np(error);
-  write_report(text,
-               std::snprintf(text, sizeof text, "quorveld: _safe_open: %s(%s) failed: %s", what, path,
-                             description == nullptr ? "unknown error" : description),
-               sizeof text);
+TroubleReport::~TroubleReport() {
+  if (length_ > 0) platform::write_error_output({text_, length_});
 }
 
-void report_log_type(const char* path, unsigned found, unsigned expected) noexcept {
+void TroubleReport::finish(int length) noexcept {
+  constexpr std::size_t kLast = sizeof text_ - 1;
+  std::size_t used = std::min(static_cast<std::size_t>(std::max(length, 0)), kLast);
+  if (suppressed > 0 && used < kLast) {
+    used += static_cast<std::size_t>(
+        std::max(0, std::snprintf(text_ + used, kLast - used, " (and %lu more such failures)", suppressed)));
+    suppressed = 0;
+  }
+  length_ = std::min(used, kLast);
+  text_[length_++] = '\n';
+}
+
+void TroubleReport::call_failed(const char* what, const char* path) noexcept {
+  const int error = errno;
   if (!is_due()) return;
-  char text[512];
-  write_report(text,
-               std::snprintf(text, sizeof text, "quorveld: _safe_open: %s type is %u, not %u", path, found, expected),
-               sizeof text);
+  const char* description = strerrordesc_np(error);
+  finish(std::snprintf(text_, sizeof text_, "quorveld: _safe_open: %s(%s) failed: %s", what, path,
+                       description == nullptr ? "unknown error" : description));
+}
+
+void TroubleReport::wrong_type(const char* path, unsigned found, unsigned expected) noexcept {
+  if (!is_due()) return;
+  finish(std::snprintf(text_, sizeof text_, "quorveld: _safe_open: %s type is %u, not %u", path, found, expected));
 }
 
 }  // namespace quorvel

@@ -6,6 +6,7 @@
 #include "log/extended_logging.h"
 #include "log/log_writer.h"
 #include "log/message.h"
+#include "platform/descriptor.h"
 #include "support/scratch_root.h"
 
 namespace quorvel::test {
@@ -151,6 +152,37 @@ TEST(LogWriter, WritesAgainOnceTheFileIsMended) {
   }
   EXPECT_EQ(root.read_file("/private/var/mobile/Library/Logs/decoy"), "untouched");
   EXPECT_FALSE(root.exists("/private/var/mobile/Library/Logs/nowhere"));
+}
+
+TEST(LogWriter, NeverWaitsForStandardError) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.make_directory(kLogFile);
+  int ends[2];
+  ASSERT_EQ(::pipe(ends), 0);
+  const Descriptor output(ends[0]), full(ends[1]);
+  ASSERT_EQ(::fcntl(full.get(), F_SETFL, O_NONBLOCK), 0);
+  while (::write(full.get(), "x", 1) == 1) continue;
+  ASSERT_EQ(::fcntl(full.get(), F_SETFL, 0), 0);
+  const Descriptor kept(::dup(STDERR_FILENO));
+  ::dup2(full.get(), STDERR_FILENO);
+  log_write_line("lost\n");
+  EXPECT_FALSE(log_took_last_line());
+  // With room again, and a minute not over, there is exactly the one report of this process: the one that was lost.
+  ::dup2(kept.get(), STDERR_FILENO);
+  testing::internal::CaptureStderr();
+  log_write_line("lost\n");
+  EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+}
+
+TEST(LogWriter, TellsOfAnObstacleOnceAMinute) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.make_directory(kLogFile);
+  testing::internal::CaptureStderr();
+  for (int i = 0; i < 3; ++i) log_write_line("lost\n");
+  EXPECT_EQ(testing::internal::GetCapturedStderr(),
+            "quorveld: _safe_open: open(/var/mobile/Library/Logs/quorveld.log) failed: Is a directory\n");
 }
 
 TEST(LogWriter, ThreadsThroughRotationsKeepEveryLineWholeAndInOrder) {

@@ -1,13 +1,13 @@
 #include "linux/base/error_line.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstdarg>
 #include <cstddef>
 #include <cstdio>
 #include <cstring>
+
+#include "platform/error_output.h"
 
 namespace quorvel::platform::host {
 
@@ -34,8 +34,7 @@ class ErrorLine {
     const auto is_control = [](char c) { return static_cast<unsigned char>(c) < ' ' || c == 0x7f; };
     std::replace_if(text_, text_ + length_, is_control, '?');
     text_[length_] = '\n';
-    // A line that cannot be written has nowhere else to go.
-    [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, text_, length_ + 1);
+    write_error_output({text_, length_ + 1});
   }
 
  private:
