@@ -2,6 +2,7 @@
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/telephony.h"
+#include "store/key_class.h"
 #include "store/key_names.h"
 
 namespace quorvel {
@@ -10,12 +11,9 @@ namespace {
 constexpr const char* kLookup = "lookup_baseband_info_new";
 constexpr const char* kCopy = "copyPostponementStuff";
 
-// Radio info is kept in memory only.
-constexpr unsigned kMemoryOnly = 1;
-
 void store_entry(const PropertyValue& key, const PropertyValue& value, void* context) noexcept {
   auto* ark = static_cast<DataArk*>(context);
-  data_ark_add_to_class(ark, nullptr, key, kMemoryOnly);
+  data_ark_add_to_class(ark, nullptr, key, kMemoryOnlyClass);
   data_ark_set(ark, nullptr, key, value);
   daemon_log(0, "__lookup_baseband_info_new_block_invoke", "got %@ = %@ from telvane", key, value);
 }

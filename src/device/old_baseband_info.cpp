@@ -4,6 +4,7 @@
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
 #include "platform/telephony.h"
+#include "store/key_class.h"
 #include "store/key_names.h"
 
 namespace quorvel {
@@ -83,7 +84,7 @@ void insert_version(DataArk* ark, const char* name, const PropertyValue& key, un
 
 void store_group_identifier(DataArk* ark, const PropertyValue& key, const PropertyValue& value) noexcept {
   if (!value) return;
-  data_ark_add_to_class(ark, nullptr, key, 1);
+  data_ark_add_to_class(ark, nullptr, key, kMemoryOnlyClass);
   data_ark_set(ark, nullptr, key, value);
 }
 
@@ -101,10 +102,10 @@ void lookup_baseband_info_old(DataArk* ark) noexcept {
   update_identity(ark, "ICCID", keys::kIntegratedCircuitCardIdentity, facts[TelephonyField::sim_identity]);
   update_identity(ark, "IMSI", keys::kInternationalMobileSubscriberIdentity,
                   facts[TelephonyField::mobile_subscriber_identity]);
-  insert_version(ark, "baseband version", keys::kBasebandVersion, 0, facts[TelephonyField::firmware_version]);
+  insert_version(ark, "baseband version", keys::kBasebandVersion, kSavedClass, facts[TelephonyField::firmware_version]);
   store_group_identifier(ark, keys::kSIMGID1, facts[TelephonyField::gid1]);
   store_group_identifier(ark, keys::kSIMGID2, facts[TelephonyField::gid2]);
-  insert_version(ark, "baseband bootloader version", keys::kBasebandBootloaderVersion, 1,
+  insert_version(ark, "baseband bootloader version", keys::kBasebandBootloaderVersion, kMemoryOnlyClass,
                  facts[TelephonyField::bootloader_version]);
 }
 

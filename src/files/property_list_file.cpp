@@ -3,15 +3,18 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 
 #include "files/error_text.h"
 #include "files/safe_open.h"
 #include "log/daemon_log.h"
 #include "platform/descriptor.h"
+#include "platform/file_system.h"
 #include "platform/flush_file.h"
 #include "platform/lock.h"
 #include "property/binary/binary.h"
+#include "property/binary/format.h"
 
 namespace quorvel {
 namespace {
@@ -26,17 +29,19 @@ constexpr off_t kLargestRead = 0x7ffff000;
 constexpr off_t kLargeFile = off_t{64} << 20;
 Lock large_load_lock;
 
-// Both start from a clean error number: a transfer that falls short without an error must not be blamed on an older
-// one.
+// A write that falls short goes on with the rest, which tells why when there is a reason.
 bool write_whole(const Descriptor& file, std::span<const std::byte> bytes) noexcept {
-  ssize_t written = 0;
-  errno = 0;
-  do {
-    written = ::write(file.get(), bytes.data(), bytes.size());
-  } while (written < 0 && errno == EINTR);
-  return written == static_cast<ssize_t>(bytes.size());
+  while (!bytes.empty()) {
+    const ssize_t written = ::write(file.get(), bytes.data(), bytes.size());
+    if (written < 0 && errno == EINTR) continue;
+    if (written == 0) errno = ENOSPC;
+    if (written <= 0) return false;
+    bytes = bytes.subspan(static_cast<std::size_t>(written));
+  }
+  return true;
 }
 
+// Starts from a clean error number: a read that falls short without an error must not be blamed on an older one.
 bool read_whole(const Descriptor& file, ByteBuffer& buffer) noexcept {
   ssize_t count = 0;
   errno = 0;
@@ -54,7 +59,10 @@ int store(const char* path, const PropertyValue& value, const OmittedEntries& om
     daemon_log(0, kStore, "Could not serialize dictionary to stream");
     return -1;
   }
-  const Descriptor file(_safe_open(path, O_WRONLY | O_CREAT | O_TRUNC, 0644, kRegularFile));
+  // A file that is to reach stable storage is a new one: another name of what stood there keeps its content.
+  const bool flushed = durability == Durability::flushed;
+  if (flushed) platform::remove_file(path);
+  const Descriptor file(_safe_open(path, O_WRONLY | O_CREAT | (flushed ? O_EXCL : O_TRUNC), 0644, kRegularFile));
   if (!file) {
     const ErrorText error;
     daemon_log(0, kStore, "Could not create %s: %s", path, error.text());
@@ -62,28 +70,64 @@ int store(const char* path, const PropertyValue& value, const OmittedEntries& om
     return -1;
   }
   // What closing the file could still report is a delayed failure of the write, which the flush has reported already.
-  if (write_whole(file, bytes.bytes()) &&
-      (durability == Durability::ordinary || platform::flush_file(file.get()) == 0)) {
-    return 0;
-  }
+  if (write_whole(file, bytes.bytes()) && (!flushed || platform::flush_file(file.get()) == 0)) return 0;
   const ErrorText error;
   daemon_log(0, kStore, "Could not write to %s: %s", path, error.text());
   log_file_and_dir_info(path);
   return -1;
 }
 
-PropertyValue read_value(const Descriptor& file, const char* path, std::size_t size, Mutability mutability,
+bool ask_status(const Descriptor& file, const char* path, struct stat& status) noexcept {
+  if (::fstat(file.get(), &status) == 0) return true;
+  const ErrorText error;
+  daemon_log(0, kLoad, "Could not fstat %s: %s", path, error.text());
+  log_file_and_dir_info(path);
+  return false;
+}
+
+bool is_unchanged(const Descriptor& file, const struct stat& before) noexcept {
+  struct stat now;
+  return ::fstat(file.get(), &now) == 0 && now.st_size == before.st_size &&
+         now.st_mtim.tv_sec == before.st_mtim.tv_sec && now.st_mtim.tv_nsec == before.st_mtim.tv_nsec;
+}
+
+// Reads a file whole. One that somebody writes to meanwhile may come out as a mix of old and new bytes: it is read once
+// more.
+bool read_steady(const Descriptor& file, const char* path, struct stat status, ByteBuffer& buffer) noexcept {
+  const off_t first_size = status.st_size;  // a file may not become one that has to wait for its turn
+  for (int tries = 0;; ++tries) {
+    if (!buffer.resize(static_cast<std::size_t>(status.st_size))) {
+      daemon_log(0, kLoad, "Could not allocate buffer");
+      return false;
+    }
+    const bool is_whole = read_whole(file, buffer);
+    const ErrorText error;
+    if (tries == 1 || is_unchanged(file, status)) {
+      if (!is_whole) daemon_log(0, kLoad, "Could not read %s: %s", path, error.text());
+      return is_whole;
+    }
+    if (::lseek(file.get(), 0, SEEK_SET) != 0 || !ask_status(file, path, status)) return false;
+    if (status.st_size > std::max(kLargeFile, first_size)) {
+      daemon_log(0, kLoad, "too big for our purposes");
+      return false;
+    }
+  }
+}
+
+// Spares a huge file that is no property list the memory, and everybody else the wait: its first bytes tell.
+bool has_header(const Descriptor& file) noexcept {
+  char start[binary_format::kHeader.size()] = {};
+  ssize_t count = 0;
+  do {
+    count = ::pread(file.get(), start, sizeof start, 0);
+  } while (count < 0 && errno == EINTR);
+  return std::string_view(start, static_cast<std::size_t>(std::max<ssize_t>(count, 0))) == binary_format::kHeader;
+}
+
+PropertyValue read_value(const Descriptor& file, const char* path, const struct stat& status, Mutability mutability,
                          CheckedBytes* checked) noexcept {
   ByteBuffer buffer;
-  if (!buffer.resize(size)) {
-    daemon_log(0, kLoad, "Could not allocate buffer");
-    return {};
-  }
-  if (!read_whole(file, buffer)) {
-    const ErrorText error;
-    daemon_log(0, kLoad, "Could not read %s: %s", path, error.text());
-    return {};
-  }
+  if (!read_steady(file, path, status, buffer)) return {};
   if (checked != nullptr && (*checked = CheckedBytes::check(buffer))) return {};
   PropertyValue value = read_binary(buffer.bytes(), mutability);
   if (!value) daemon_log(0, kLoad, "Could not create dictionary from stream");
@@ -99,20 +143,18 @@ PropertyValue load(const char* path, Mutability mutability, CheckedBytes* checke
     return {};
   }
   struct stat status;
-  if (::fstat(file.get(), &status) != 0) {
-    const ErrorText error;
-    daemon_log(0, kLoad, "Could not fstat %s: %s", path, error.text());
-    log_file_and_dir_info(path);
-    return {};
-  }
+  if (!ask_status(file, path, status)) return {};
   if (status.st_size > kLargestRead) {
     daemon_log(0, kLoad, "too big for our purposes");
     return {};
   }
-  const auto size = static_cast<std::size_t>(status.st_size);
-  if (status.st_size <= kLargeFile) return read_value(file, path, size, mutability, checked);
+  if (status.st_size <= kLargeFile) return read_value(file, path, status, mutability, checked);
+  if (!has_header(file)) {
+    daemon_log(0, kLoad, "Could not create dictionary from stream");
+    return {};
+  }
   const LockHold one_at_a_time(large_load_lock);
-  return read_value(file, path, size, mutability, checked);
+  return read_value(file, path, status, mutability, checked);
 }
 
 }  // namespace

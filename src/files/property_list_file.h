@@ -10,8 +10,9 @@ namespace quorvel {
 /// Returns 0, or -1 after logging why; the file may then hold part of the value.
 [[nodiscard]] int store_dict(const char* path, const PropertyValue& value) noexcept;
 
-/// `store_dict`, without the entries of `value` that are `omitted`, and with the content brought to stable storage
-/// before it returns 0.
+/// Writes `value`, without its entries that are `omitted`, to a new file of mode 0644 at `path`, in place of whatever
+/// file, link or socket stood there, and brings the content to stable storage. Returns 0, or -1 after logging why; part
+/// of the file may then be there.
 [[nodiscard]] int store_dict_durably(const char* path, const PropertyValue& value,
                                      const OmittedEntries& omitted) noexcept;
 

@@ -6,6 +6,8 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <ctime>
+#include <utility>
 
 #include "files/error_text.h"
 #include "log/daemon_log.h"
@@ -66,13 +68,26 @@ bool create(const char* path, int flags, mode_t mode, Descriptor& file) noexcept
   return true;
 }
 
+// An open that does not wait fails while somebody holds a lease on the file, and has the kernel ask for it back: the
+// holder gets a moment for that.
+Descriptor open_existing(const char* path, int flags) noexcept {
+  constexpr int kTries = 20;
+  constexpr timespec kPause{0, 50'000'000};
+  Descriptor file(platform::open_file(path, flags, 0));
+  for (int tries = 1; !file && errno == EWOULDBLOCK && tries < kTries; ++tries) {
+    ::nanosleep(&kPause, nullptr);
+    file = Descriptor(platform::open_file(path, flags, 0));
+  }
+  return file;
+}
+
 // Opens without truncating anything and without ever waiting for the other end of a FIFO. False after logging why.
 bool open_unchecked(const char* path, int flags, mode_t mode, Descriptor& file) noexcept {
   const int careful = (flags & ~O_TRUNC) | O_NOFOLLOW | O_NONBLOCK;
   const bool creates = (flags & O_CREAT) != 0;
   bool missing = creates && (flags & O_EXCL) != 0;
   if (!missing) {
-    file = Descriptor(platform::open_file(path, careful & ~O_CREAT, 0));
+    file = open_existing(path, careful & ~O_CREAT);
     missing = creates && !file && errno == ENOENT;
   }
   if (missing && !create(path, careful, mode, file)) return false;
@@ -82,9 +97,23 @@ bool open_unchecked(const char* path, int flags, mode_t mode, Descriptor& file) 
   return false;
 }
 
-bool is_at_path(const Descriptor& file, const char* path) noexcept {
+// True when a rename has put another file in the place of the open one since it was opened, while a further name keeps
+// it: only then does the system report a removed name with its mark.
+bool was_replaced(const char* path, const char* actual) noexcept {
+  const std::size_t length = std::strlen(path);
+  return std::strncmp(path, actual, length) == 0 && std::strcmp(actual + length, " (deleted)") == 0;
+}
+
+// Opens the object that is at `path` and at no other; none after logging why not.
+Descriptor open_at_path(const char* path, int flags, mode_t mode) noexcept {
+  constexpr int kTries = 10;
   char actual[platform::kPathSize];
-  return query_path(file, path, actual) && is_same_path(path, actual);
+  for (int tries = 1;; ++tries) {
+    Descriptor file;
+    if (!open_unchecked(path, flags, mode, file) || !query_path(file, path, actual)) return {};
+    if (was_replaced(path, actual) && (flags & O_EXCL) == 0 && tries < kTries) continue;
+    return is_same_path(path, actual) ? std::move(file) : Descriptor();
+  }
 }
 
 bool has_type(const Descriptor& file, const char* path, mode_t expected_type) noexcept {
@@ -120,9 +149,8 @@ bool finish_open(const Descriptor& file, const char* path, int flags, mode_t typ
 }  // namespace
 
 int _safe_open(const char* path, int flags, mode_t mode, mode_t expected_type) noexcept {
-  Descriptor file;
-  if (!open_unchecked(path, flags, mode, file)) return -1;
-  if (!is_at_path(file, path) || !has_type(file, path, expected_type)) return -1;
+  Descriptor file = open_at_path(path, flags, mode);
+  if (!file || !has_type(file, path, expected_type)) return -1;
   if (!finish_open(file, path, flags, expected_type)) return -1;
   return file.take();
 }

@@ -146,11 +146,11 @@ bool WalkBudget::enter(const PropertyValue& container) noexcept {
   return repeated_nodes_ <= kMaximumRepeatedNodes;
 }
 
-bool is_within_limits(const PropertyValue& value) noexcept {
+bool is_within_limits(const PropertyValue& value, std::size_t containers_around) noexcept {
   if (!value.is_container()) return true;
   Measure measure;
   Extent whole = {};
-  return measure.add(value, 1, whole) && whole.nodes - measure.distinct() <= kMaximumRepeatedNodes;
+  return measure.add(value, 1 + containers_around, whole) && whole.nodes - measure.distinct() <= kMaximumRepeatedNodes;
 }
 
 }  // namespace quorvel

@@ -37,7 +37,7 @@ class WalkBudget {
   std::size_t seen_count_ = 0;
 };
 
-/// True when a walk over `value` stays within the bounds. Any thread.
-[[nodiscard]] bool is_within_limits(const PropertyValue& value) noexcept;
+/// True when a walk over `value` stays within the bounds, with so many containers around it. Any thread.
+[[nodiscard]] bool is_within_limits(const PropertyValue& value, std::size_t containers_around = 0) noexcept;
 
 }  // namespace quorvel

@@ -1,26 +1,41 @@
 #include "store/data_ark.h"
 
 #include "log/daemon_log.h"
+#include "property/walk.h"
 #include "store/data_ark_record.h"
 
 namespace quorvel {
 
 namespace {
 
-// Adds an entry that is not there; it joins the classes of its domain, which are added to `classes`, those it is in
-// already. `shared` is its key where a mark holds it, so that a marked key has its text in memory once. False, and
-// nothing changed, when memory runs out.
-bool insert(DataArk& ark, const StoreKey& key, PropertyValue shared, PropertyValue value, unsigned& classes) noexcept
-    QUORVEL_REQUIRES(ark.lock) {
+// What the class marks say about a store key: the key's text as they hold it, and the classes it is in.
+struct Marks {
+  PropertyValue key;
+  unsigned classes = 0;
+};
+
+Marks marks_of(const DataArk& ark, const HashedKey& key) noexcept QUORVEL_REQUIRES(ark.lock) {
+  const DictionaryEntry entry = ark.class_marks.find(key);
+  return {entry.key, DataArk::classes_in(entry.value)};
+}
+
+// Adds an entry that is not there; its key joins the classes of its domain, which `marks` then tells as well. A key
+// that the marks hold is shared with them, so that its text is in memory once. False, and nothing changed, when memory
+// runs out.
+bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, Marks& marks) noexcept QUORVEL_REQUIRES(ark.lock) {
   unsigned joined = 0;
-  if (key.has_key() && ark.class_marks.size() > 0) joined = ark.classes_of(key.domain_text()) & ~classes;
-  if (joined != 0 && !ark.add_to_classes(key.hashed(), joined)) return false;
-  classes |= joined;
-  if (!shared && joined != 0) shared = ark.class_marks.find(key.hashed()).key;
-  if (ark.values.add(key.hashed(), std::move(shared), std::move(value))) return true;
+  if (key.has_key() && ark.class_marks.size() > 0) joined = ark.classes_of(key.domain_text()) & ~marks.classes;
+  if (joined != 0) {
+    if (!ark.add_to_classes(key.hashed(), joined)) return false;
+    marks = marks_of(ark, key.hashed());
+  }
+  if (ark.values.add(key.hashed(), marks.key, std::move(value))) return true;
   if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
 }
+
+// A save puts every value into one dictionary: what fits no bound there would take all the others along.
+bool can_be_saved(const PropertyValue& value) noexcept { return !value.is_container() || is_within_limits(value, 1); }
 
 void post_set_events(const DataArk& ark, const StoreKey& key, bool changed) noexcept QUORVEL_REQUIRES(ark.lock) {
   if (!ark.registries[kOnChanged] && !ark.registries[kOnSet]) return;
@@ -43,6 +58,10 @@ int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue&
   }
   const StoreKey store_key(domain, key);
   if (!store_key) return -1;
+  if (!can_be_saved(value)) {
+    daemon_log(0, "data_ark_set", "value of %s is nested too deep or repeats too much to be saved", store_key.text());
+    return -1;
+  }
   PropertyValue stored(value);  // becomes the old value, which ends after the lock is given back
   const LockHold hold(ark->lock);
   const bool is_first = !ark->values;
@@ -50,17 +69,15 @@ int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue&
   if (!ark->values) return -1;
   PropertyValue* const slot = ark->values.slot(store_key.hashed());
   const bool changed = slot == nullptr || !(*slot == value);
-  const PropertyValue none;
-  const DictionaryEntry marks = changed ? ark->class_marks.find(store_key.hashed()) : DictionaryEntry{none, none};
-  unsigned classes = changed ? DataArk::classes_in(marks.value) : 0;
+  Marks marks = changed ? marks_of(*ark, store_key.hashed()) : Marks{};
   if (slot != nullptr) {
     std::swap(*slot, stored);
-  } else if (!insert(*ark, store_key, marks.key, std::move(stored), classes)) {
+  } else if (!insert(*ark, store_key, std::move(stored), marks)) {
     if (is_first) ark->values = nullptr;
     return -1;
   }
   post_set_events(*ark, store_key, changed);
-  if (changed && (classes & kUncountedSet) == 0) {
+  if (changed && (marks.classes & kUncountedSet) == 0) {
     daemon_log(0, "data_ark_set", "dirtied by changing %s", store_key.text());
     ++ark->change_count;
   }

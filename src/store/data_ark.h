@@ -23,7 +23,8 @@ enum DataArkEvent : unsigned { kEventSet = 1, kEventRemoved = 2, kEventChanged =
 /// Saves the entries outside classes 1 and 7, all or nothing; an empty save removes the file.
 void data_ark_store(DataArk* ark) noexcept;
 
-/// Stores `value`. Returns 0, or -1 when there is no value or memory runs out; nothing is changed then.
+/// Stores `value`. Returns 0, or -1 when there is no value, when no save could write it (it is nested too deep or
+/// repeats too much) or memory runs out; nothing is changed then.
 int data_ark_set(DataArk* ark, const PropertyValue& domain, const PropertyValue& key,
                  const PropertyValue& value) noexcept;
 
@@ -36,12 +37,13 @@ int data_ark_remove(DataArk* ark, const PropertyValue& domain, const PropertyVal
 /// 1 when the entry is stored, else 0. Keys that are answered live do not count.
 [[nodiscard]] int data_ark_exists(DataArk* ark, const PropertyValue& domain, const PropertyValue& key) noexcept;
 
-/// Marks a store key with a class from 0 to 8. Returns 0, or -1 for another class or when memory runs out.
+/// Marks a store key with a class from 0 to 8 (store/key_class.h). Returns 0, or -1 for another class or when memory
+/// runs out.
 int data_ark_add_to_class(DataArk* ark, const PropertyValue& domain, const PropertyValue& key,
                           unsigned key_class) noexcept;
 
 /// Has `name` posted at the events of the mask `events`; a later name replaces an earlier one. Returns 0, or -1 when
-/// memory runs out.
+/// memory runs out: of changed, set and removed, in this order, those before the failure are registered.
 int data_ark_register_notification(DataArk* ark, const PropertyValue& domain, const PropertyValue& key,
                                    const PropertyValue& name, unsigned events) noexcept;
 

@@ -10,8 +10,10 @@
 #include "files/property_list_file.h"
 #include "files/value_helpers.h"
 #include "log/daemon_log.h"
+#include "log/log_writer.h"
 #include "platform/descriptor.h"
 #include "platform/device_paths.h"
+#include "platform/error_output.h"
 #include "store/data_ark.h"
 #include "store/data_ark_record.h"
 
@@ -24,8 +26,7 @@ void compose(char (&path)[platform::kPathSize], const char* head, const char* ta
   static_cast<void>(std::snprintf(path, sizeof path, "%.500s%s", head, tail));
 }
 
-// Anything that stands there counts, a link that leads nowhere just now included: only an error that says so means that
-// nothing does.
+// True unless the path certainly names nothing: a dangling link, and whatever cannot be looked at, count as something.
 bool something_is_there(const char* path) noexcept {
   const Descriptor object(platform::open_file(path, O_PATH | O_NOFOLLOW, 0));
   return object || (errno != ENOENT && errno != ENOTDIR);
@@ -61,30 +62,48 @@ bool set_aside(DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRE
   return true;
 }
 
-void remove_data_file(const DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRES(ark.lock) {
+// Whether the removal, where there was something to remove, will outlast a power cut.
+bool remove_data_file(const DataArk& ark, const DataArkPaths& paths) noexcept QUORVEL_REQUIRES(ark.lock) {
   if (ark.file_is_unreadable) {
     daemon_log(0, "data_ark_store", "%s could not be loaded, left it where it is", paths.file);
-  } else {
-    platform::remove_file(paths.file);
+    return true;
   }
+  if (platform::remove_file(paths.file) != 0 || platform::flush_directory(paths.directory) == 0) return true;
+  daemon_log(0, "data_ark_store", "Could not store %s", paths.file);
+  return false;
 }
 
-void replace_data_file(DataArk& ark, const DataArkPaths& paths, const OmittedEntries& unsaved) noexcept
+// False when the entries are not in the data file for good.
+bool replace_data_file(DataArk& ark, const DataArkPaths& paths, const OmittedEntries& unsaved) noexcept
     QUORVEL_REQUIRES(ark.lock) {
   if (store_dict_durably(paths.temporary, ark.values, unsaved) != 0) {
     daemon_log(0, "data_ark_store", "Could not store %s", paths.temporary);
-    return;
+    // Half of a file may hold the last blocks of a full disk.
+    platform::remove_file(paths.temporary);
+    return false;
   }
-  if (ark.file_is_unreadable && !set_aside(ark, paths)) return;
+  if (ark.file_is_unreadable && !set_aside(ark, paths)) return false;
   if (platform::rename_file(paths.temporary, paths.file) != 0) {
     daemon_log(0, "data_ark_store", "Problem renaming %s: %s", paths.temporary, ErrorText().text());
-    return;
+    return false;
   }
   if (platform::flush_directory(paths.directory) != 0) {
     daemon_log(0, "data_ark_store", "Could not store %s", paths.file);
-    return;
+    return false;
   }
   if (extended_logging != 0) daemon_log(0, "data_ark_store", "saved");
+  return true;
+}
+
+bool save(DataArk& ark, const DataArkPaths& paths) noexcept {
+  const LockHold hold(ark.lock);
+  ark.change_count = 0;
+  OmittedEntries unsaved;
+  if (!find_unsaved_entries(ark, unsaved)) {
+    daemon_log(0, "data_ark_store", "Nothing mutable changed!");
+    return false;
+  }
+  return ark.values.size() == unsaved.count() ? remove_data_file(ark, paths) : replace_data_file(ark, paths, unsaved);
 }
 
 }  // namespace
@@ -113,16 +132,10 @@ DataArk* data_ark_load() noexcept {
 
 void data_ark_store(DataArk* ark) noexcept {
   const DataArkPaths paths;
-  const LockHold hold(ark->lock);
-  OmittedEntries unsaved;
-  if (!find_unsaved_entries(*ark, unsaved)) {
-    daemon_log(0, "data_ark_store", "Nothing mutable changed!");
-  } else if (ark->values.size() == unsaved.count()) {
-    remove_data_file(*ark, paths);
-  } else {
-    replace_data_file(*ark, paths, unsaved);
-  }
-  ark->change_count = 0;
+  if (save(*ark, paths) || log_took_last_line()) return;
+  // A disk that takes no save seldom takes the log's line about it.
+  constexpr std::string_view kLost = "quorveld: data_ark_store: the data ark could not be saved\n";
+  platform::write_error_output(kLost);
 }
 
 }  // namespace quorvel

@@ -6,18 +6,14 @@
 
 #include "platform/lock.h"
 #include "property/value.h"
+#include "store/key_class.h"
 #include "store/store_key.h"
 
 namespace quorvel {
 
-inline constexpr unsigned kClassCount = 9;
 [[nodiscard]] constexpr unsigned class_bit(unsigned key_class) noexcept { return 1u << key_class; }
 inline constexpr unsigned kAllClasses = (1u << kClassCount) - 1;
 
-// The classes that the store itself interprets.
-inline constexpr unsigned kMemoryOnlyClass = 1;
-inline constexpr unsigned kQuietSetClass = 5;
-inline constexpr unsigned kVolatileClass = 7;
 /// Keys that a save leaves out and whose changes do not count; keys whose changes by a set do not count.
 inline constexpr unsigned kUnsaved = class_bit(kMemoryOnlyClass) | class_bit(kVolatileClass);
 inline constexpr unsigned kUncountedSet = kUnsaved | class_bit(kQuietSetClass);

@@ -26,17 +26,11 @@ int data_ark_register_notification(DataArk* ark, const PropertyValue& domain, co
   const StoreKey store_key(domain, key);
   if (!store_key) return -1;
   const LockHold hold(ark->lock);
-  // All of the registries or none: copies of the few that change take their place at the end.
-  std::array<PropertyValue, kRegistryCount> changed;
   for (const auto& event : kEvents) {
     if ((events & event.bit) == 0) continue;
-    const PropertyValue& registry = ark->registries[event.registry];
-    PropertyValue& copy = changed[event.registry];
-    copy = registry ? registry.mutable_copy() : PropertyValue::dictionary();
-    if (!copy || !copy.set(store_key.hashed(), name)) return -1;
-  }
-  for (unsigned i = 0; i < kRegistryCount; ++i) {
-    if (changed[i]) std::swap(ark->registries[i], changed[i]);
+    PropertyValue& registry = ark->registries[event.registry];
+    if (!registry) registry = PropertyValue::dictionary();
+    if (!registry.set(store_key.hashed(), name)) return -1;
   }
   return 0;
 }

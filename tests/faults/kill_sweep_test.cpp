@@ -68,6 +68,14 @@ class KillSweep : public testing::Test {
 
 TEST_F(KillSweep, AtEveryCall) {
   const std::uint32_t calls = calls_of_a_start();
+  // What makes a save safe from a power cut is the order of these.
+  using faults::Call;
+  std::vector<Call> order;
+  const std::vector<Call> trace = daemon.trace();
+  for (std::size_t i = daemon.plan().save_begun - 1; i < trace.size() && order.size() < 4; ++i) {
+    if (trace[i] == Call::write || trace[i] == Call::fdatasync || trace[i] == Call::renameat) order.push_back(trace[i]);
+  }
+  EXPECT_EQ(order, (std::vector<Call>{Call::write, Call::fdatasync, Call::renameat, Call::fdatasync}));
   for (const Action action : {Action::kill_before, Action::kill_after}) {
     for (std::uint32_t number = 1; number <= calls; ++number) {
       faults::Plan& plan = daemon.prepare();

@@ -49,6 +49,13 @@ TEST_F(PropertyListFile, WhatIsStoredIsLoadedEqual) {
     }
   }
   EXPECT_EQ(root.mode_of(kFile), 0644u);
+  // A durable store makes a new file, whatever stood there; another name of that keeps its content and mode.
+  root.set_mode(kFile, 0600);
+  root.write_file(kFile, "linked");
+  std::filesystem::create_hard_link(root.path(kFile), root.path(kFolder + "/other"));
+  ASSERT_EQ(store_whole_durably(kFile.c_str(), sample()), 0);
+  EXPECT_EQ(root.read_file(kFolder + "/other"), "linked");
+  EXPECT_EQ(root.mode_of(kFile), 0644u);
   root.set_mode(kFile, 0600);
   EXPECT_EQ(store_dict(kFile.c_str(), array({})), 0);
   EXPECT_EQ(root.mode_of(kFile), 0600u);
@@ -79,6 +86,12 @@ TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
     EXPECT_FALSE(load_dict(kFile.c_str()));
     root.expect_log({"_load_dict: Could not create dictionary from stream"});
   }
+  std::filesystem::resize_file(root.path(kFile), 1 << 30);
+  EXPECT_FALSE(load_dict(kFile.c_str()));
+  root.expect_log({"_load_dict: Could not create dictionary from stream"});
+  rusage used{};
+  ASSERT_EQ(::getrusage(RUSAGE_SELF, &used), 0);
+  EXPECT_LT(used.ru_maxrss, 1 << 19) << "its first bytes are enough";
   std::filesystem::resize_file(root.path(kFile), 0x7ffff001);
   EXPECT_FALSE(load_mutable_dict(kFile.c_str()));
   root.expect_log({"_load_dict: too big for our purposes"});
@@ -106,8 +119,8 @@ TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
   ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &limit), 0);
   for (const auto store : {store_dict, store_whole_durably}) {
     EXPECT_EQ(store(kFile.c_str(), text(std::string(100'000, 'x'))), -1);
-    root.expect_log(
-        {"store_dict: Could not write to " + kFile + ": Success", info(kFile, "100644"), info(kFolder, "40755")});
+    root.expect_log({"store_dict: Could not write to " + kFile + ": File too large", info(kFile, "100644"),
+                     info(kFolder, "40755")});
   }
   EXPECT_EQ(root.read_file(kFile).size(), 65536u);
 }

@@ -223,5 +223,31 @@ TEST(SafeOpenRace, AFileReplacedByARenameIsNeverRefused) {
   EXPECT_GT(provisioner.rounds(), 100);
 }
 
+TEST(SafeOpenRace, AFileWhoseOldContentABackupKeepsIsNeverRefused) {
+  ScratchRoot root;
+  root.write_file("/file", "");
+  const Meddler provisioner([&] {
+    root.write_file("/fresh", "");
+    ::unlink(root.path("/backup").c_str());
+    ::link(root.path("/file").c_str(), root.path("/backup").c_str());
+    std::filesystem::rename(root.path("/fresh"), root.path("/file"));
+  });
+  for (int i = 0; i < 50'000; ++i) ASSERT_TRUE(Descriptor(_safe_open("/file", O_RDONLY, 0, kRegularFile)));
+  EXPECT_GT(provisioner.rounds(), 100);
+}
+
+TEST_F(SafeOpen, WaitsAMomentForALease) {
+  const std::string path = root.path(kHome + "/file");
+  Descriptor holder(::open(path.c_str(), O_RDONLY));
+  ::signal(SIGIO, SIG_IGN);
+  ASSERT_EQ(::fcntl(holder.get(), F_SETLEASE, F_RDLCK), 0);
+  std::thread yielding([&] {
+    std::this_thread::sleep_for(120ms);
+    ::fcntl(holder.get(), F_SETLEASE, F_UNLCK);
+  });
+  EXPECT_TRUE(Descriptor(_safe_open((kHome + "/file").c_str(), O_WRONLY, 0, kRegularFile)));
+  yielding.join();
+}
+
 }  // namespace
 }  // namespace quorvel::test

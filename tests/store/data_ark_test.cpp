@@ -1,5 +1,7 @@
 #include "store/data_ark.h"
 
+#include <sys/resource.h>
+
 #include "log/daemon_log.h"
 #include "platform/process.h"
 #include "quorvel/observer.h"
@@ -212,8 +214,8 @@ TEST(DataArkFile, AFailedSaveLeavesTheFileAndIsTold) {
   data_ark_store(ark);
   const auto lines = root.log_lines();
   ASSERT_EQ(lines.size(), 5u);
-  EXPECT_EQ(lines[0], "_safe_open: open(" + kTemporary + ") failed: Is a directory");
-  EXPECT_EQ(lines[1], "store_dict: Could not create " + kTemporary + ": Is a directory");
+  EXPECT_EQ(lines[0], "_safe_open: open(" + kTemporary + ") failed: File exists");
+  EXPECT_EQ(lines[1], "store_dict: Could not create " + kTemporary + ": File exists");
   EXPECT_EQ(lines[4], "data_ark_store: Could not store " + kTemporary);
   EXPECT_EQ(root.read_plist(kFile), before);
   root.remove(kTemporary);
@@ -226,6 +228,63 @@ TEST(DataArkFile, AFailedSaveLeavesTheFileAndIsTold) {
   data_ark_store(ark);
   EXPECT_EQ(root.read_plist(kFile), dictionary({{"-kept", 1}, {"-new", "x"}}));
   root.expect_log({"data_ark_store: saved"});
+}
+
+TEST(DataArkFile, WhatStandsAtTheTemporaryNameIsReplaced) {
+  ScratchRoot root;
+  root.ignore_log();
+  const PropertyValue before = dictionary({{"-kept", 1}}), after = dictionary({{"-kept", 1}, {"-new", "x"}});
+  const struct {
+    const char* name;
+    void (*put)(ScratchRoot&);
+  } squatters[] = {
+      {"link to the data file", [](ScratchRoot& r) { r.make_link("data_ark.plist", kTemporary); }},
+      {"FIFO", [](ScratchRoot& r) { r.make_fifo(kTemporary); }},
+      {"file of another mode", [](ScratchRoot& r) { r.write_file(kTemporary, "x"), r.set_mode(kTemporary, 0600); }},
+      {"hard link", [](ScratchRoot& r) { std::filesystem::create_hard_link(r.path(kFile), r.path(kTemporary)); }},
+  };
+  for (const auto& [name, put] : squatters) {
+    if (root.exists(kFile)) root.remove(kFile);
+    root.write_plist(kFile, before);
+    DataArk* ark = load_kept_ark();
+    data_ark_set(ark, nullptr, text("new"), text("x"));
+    put(root);
+    std::filesystem::create_hard_link(root.path(kFile), root.outside() / name);
+    data_ark_store(ark);
+    EXPECT_EQ(root.read_plist(kFile), after) << name;
+    EXPECT_EQ(root.mode_of(kFile), 0644u) << name;
+    EXPECT_FALSE(root.exists(kTemporary)) << name;
+    EXPECT_NE(std::filesystem::hard_link_count(root.outside() / name), 0u);
+    EXPECT_EQ(std::filesystem::file_size(root.outside() / name), encoded(before).size()) << name;
+  }
+  // A save that runs out of room leaves no half of a file behind, and a full disk takes no line about it either.
+  DataArk* ark = load_kept_ark();
+  data_ark_set(ark, nullptr, text("large"), text(std::string(100'000, 'x')));
+  std::signal(SIGXFSZ, SIG_IGN);
+  root.write_file(kLogFile, std::string(70'000, '.'));
+  const rlimit limit{65536, RLIM_INFINITY};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &limit), 0);
+  testing::internal::CaptureStderr();
+  data_ark_store(ark);
+  EXPECT_TRUE(testing::internal::GetCapturedStderr().ends_with("data_ark_store: the data ark could not be saved\n"));
+  EXPECT_FALSE(root.exists(kTemporary));
+  EXPECT_EQ(root.read_plist(kFile), after);
+}
+
+TEST_F(DataArkTest, AValueThatNoSaveCouldWriteIsRefused) {
+  const auto nested = [](int depth) {
+    PropertyValue value = PropertyValue::array();
+    for (int i = 1; i < depth; ++i) value = array({value});
+    return value;
+  };
+  EXPECT_EQ(set(nullptr, text("deepest"), nested(511)), 0);
+  EXPECT_EQ(set(nullptr, text("deeper"), nested(512)), -1);
+  EXPECT_EQ(data_ark_exists(ark_, nullptr, text("deeper")), 0);
+  data_ark_store(ark_);
+  root_.expect_log({"data_ark_set: dirtied by changing -deepest",
+                    "data_ark_set: value of -deeper is nested too deep or repeats too much to be saved",
+                    "data_ark_store: saved"});
+  EXPECT_EQ(data_ark_register_notification(ark_, nullptr, text("k"), nullptr, kEventSet), -1);
 }
 
 TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
