@@ -110,6 +110,7 @@ bool all(const auto&... values) { return (static_cast<bool>(values) && ...); }
 // Plays the telephony service: an event that stands ready when the center's run loop starts.
 void send_event(Things&) {
   platform::TelephonyCenter* center = platform::default_telephony_center();
+  platform::bind_to_run_loop(center, platform::main_run_loop(), platform::RunLoopMode::default_mode);
   static SocketPeer peer = accept_from(telephony);
   const PropertyValue info = dictionary({{"Status", "Ready"}, {"Carrier", "Sample"}, {"Bands", array({1, 2})}});
   PropertyValue state = PropertyValue::dictionary();
@@ -118,7 +119,6 @@ void send_event(Things&) {
     EXPECT_TRUE(state.set(field, dictionary({{"Value", is_info ? Value(info) : Value(field)}})));
   }
   EXPECT_TRUE(peer.send(frame_bytes(wire::FrameKind::event, 0, "sim-status-changed", state)));
-  platform::bind_to_run_loop(center, platform::main_run_loop(), platform::RunLoopMode::default_mode);
   ::raise(SIGTERM);  // ends the loop behind what stands there already
 }
 
@@ -169,7 +169,7 @@ void end_service(Things& t) {
   platform::release_listener(t.listener);
 }
 
-enum class Kind { ordinary, once_only, may_die };
+enum class Kind { ordinary, once_only, in_steps, may_die };  // in steps: those before the failed one stay done
 
 struct Case {
   const char* name;
@@ -216,7 +216,8 @@ const Case kCases[] = {
     {"data_ark_exists", [](Things& t) { return data_ark_exists(t.ark.get(), t.key, t.key) == 1; }},
     {"data_ark_add_to_class", [](Things& t) { return data_ark_add_to_class(t.ark.get(), {}, t.key, 1) == 0; }},
     {"data_ark_register_notification",
-     [](Things& t) { return data_ark_register_notification(t.ark.get(), {}, t.key, t.key, 7) == 0; }},
+     [](Things& t) { return data_ark_register_notification(t.ark.get(), {}, t.key, t.key, 7) == 0; }, 0,
+     Kind::in_steps},
     {"data_ark_key", [](Things& t) { return all(data_ark_key(t.domain, t.key)); }},
     {"data_ark_copy", [](Things& t) { return data_ark_copy(t.ark.get(), t.key, t.key) == t.key; }},
     {"data_ark_copy, a domain", [](Things& t) { return data_ark_copy(t.ark.get(), t.domain, {}).size() == 20; }},
@@ -249,7 +250,7 @@ long run(const Case& c, Fault fault, long number) {
   const bool done = c.operation(things);
   const long failed = allocations::stop_failing();
   EXPECT_TRUE(done || failed > 0);
-  EXPECT_TRUE(done || things.state() == before);
+  EXPECT_TRUE(done || c.kind == Kind::in_steps || things.state() == before);
   EXPECT_TRUE(things.holders[0] == entries("", 20) && things.holders[1] == array({1, 2, 3, 4}));
   if (c.behind != nullptr) c.behind(things);
   return failed;

@@ -25,8 +25,6 @@ namespace quorvel::platform {
 
 namespace {
 
-// A device with this file has a telephony service, though perhaps not yet.
-
 // Pauses between attempts to reach a service that is there but does not answer, in milliseconds.
 constexpr int kFirstDelay = 100;
 constexpr int kLongestDelay = 2000;
@@ -97,6 +95,11 @@ void TelephonyCenter::look_for_service() noexcept {
     case host::TelephonyStream::Connection::busy:
       say("Listening; the telephony service cannot be followed: standard error says why");
       return schedule_try();
+    case host::TelephonyStream::Connection::barred:
+      say("Listening; the telephony service cannot be followed: standard error says why");
+      // The refusal may have been the moment's. One that lasts ends with a change in the directory, which is watched.
+      if (delay_ < kLongestDelay) return schedule_try();
+      break;
     case host::TelephonyStream::Connection::absent: say("Listening; waiting for the telephony service"); break;
   }
   if (directory_watch_ < 0) schedule_try();

@@ -25,9 +25,12 @@ constexpr char kPath[] = "/run/quorvel/telvane.sock";
 static_assert(std::string_view(kPath).starts_with(wire::kServiceDirectory) &&
               std::string_view(kPath).ends_with(wire::kTelephonySocket));
 
-// True for an error that passes without anything changing in the service directory.
-[[nodiscard]] bool may_pass(int error) noexcept {
-  return error != ENOENT && error != EACCES && error != EPERM && error != EPROTOTYPE && error != ELOOP;
+// How long an error lasts: until something changes in the service directory, or perhaps not so long.
+[[nodiscard]] TelephonyStream::Connection outcome_of(int error) noexcept {
+  using Connection = TelephonyStream::Connection;
+  if (error == ENOENT) return Connection::absent;
+  const bool lasts = error == EACCES || error == EPERM || error == EPROTOTYPE || error == ELOOP;
+  return lasts ? Connection::barred : Connection::busy;
 }
 
 void tell_unreachable(int error) noexcept {
@@ -65,9 +68,9 @@ TelephonyStream::Connection TelephonyStream::connect() noexcept {
   if (!socket) {
     const int error = errno;
     tell_unreachable(error);
-    return may_pass(error) ? Connection::busy : Connection::absent;
+    return outcome_of(error);
   }
-  if (!is_trusted(directory.get(), socket.get())) return Connection::absent;
+  if (!is_trusted(directory.get(), socket.get())) return Connection::barred;
   close();
   socket_ = std::move(socket);
   return Connection::open;

@@ -12,8 +12,9 @@ namespace quorvel::platform::host {
 class TelephonyStream {
  public:
   enum class Result { frame, nothing, gone };
-  /// `absent`: nothing will be there before the service directory changes. `busy`: trying again may help.
-  enum class Connection { open, absent, busy };
+  /// `absent`: nothing will be there before the service directory changes. `barred`: what is there may not be used,
+  /// which a change there will end. `busy`: trying again may help.
+  enum class Connection { open, absent, barred, busy };
 
   /// True when something, whatever it is, stands at the place of the service's socket.
   [[nodiscard]] static bool has_place() noexcept;
