@@ -1,4 +1,4 @@
-// Small helpers over values that the rooms above share. Any thread may call everything here.
+// Small helpers over values that the folders above share. Any thread may call everything here.
 #pragma once
 
 #include <cstddef>

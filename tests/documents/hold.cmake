@@ -57,6 +57,23 @@ foreach(row IN LISTS rows)
   endforeach()
 endforeach()
 
+# The page on the wire names each telephony field, SIM status, event and command.
+file(READ ${TREE}/docs/wire.md wire)
+file(READ ${TREE}/src/wire/telephony_state.h state)
+file(READ ${TREE}/src/platform/telephony.h telephony)
+string(REGEX MATCHALL "k[A-Za-z0-9]+(Field|Command) = \"[^\"]+|kSimStatus[A-Za-z]+ = \"[A-Z][^\"]+" told "${state}")
+string(REGEX MATCHALL "k[A-Za-z]+(Inserted|Changed) = \"[^\"]+" events "${telephony}")
+list(LENGTH told count)
+if(count LESS 20)
+  message(SEND_ERROR "hardly a telephony field, status or command was found: ${count}")
+endif()
+foreach(definition IN LISTS told events)
+  string(REGEX REPLACE ".*\"" "" name "${definition}")
+  if(NOT wire MATCHES "`${name}[`( ]")
+    message(SEND_ERROR "docs/wire.md does not name ${name}")
+  endif()
+endforeach()
+
 # Every decision stands in the list of them.
 file(READ ${TREE}/docs/decisions/README.md list)
 file(GLOB decisions RELATIVE ${TREE}/docs/decisions ${TREE}/docs/decisions/*.md)
