@@ -229,7 +229,7 @@ TEST(SafeOpenRace, AFileWhoseOldContentABackupKeepsIsNeverRefused) {
   const Meddler provisioner([&] {
     root.write_file("/fresh", "");
     ::unlink(root.path("/backup").c_str());
-    ::link(root.path("/file").c_str(), root.path("/backup").c_str());
+    EXPECT_EQ(::link(root.path("/file").c_str(), root.path("/backup").c_str()), 0);
     std::filesystem::rename(root.path("/fresh"), root.path("/file"));
   });
   for (int i = 0; i < 50'000; ++i) ASSERT_TRUE(Descriptor(_safe_open("/file", O_RDONLY, 0, kRegularFile)));
