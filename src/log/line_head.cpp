@@ -7,6 +7,8 @@
 #include <cstdio>
 #include <ctime>
 
+#include "platform/lock.h"
+
 namespace quorvel {
 
 namespace {
@@ -19,13 +21,18 @@ struct Head {
 };
 thread_local constinit Head head{-1, 0, 0, {}};
 
+constinit Lock zone_lock;
+
 // The form of ctime, whose own function fails for the years it has no room for.
 int format_stamp(time_t second, char* out, std::size_t room) noexcept {
   constexpr const char* kDays[] = {"Sun", "Mon", "Tue", "Wed", "Thu", "Fri", "Sat"};
   constexpr const char* kMonths[] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
                                      "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};
-  // The zone may have changed since the last second, on a device that travels.
-  tzset();
+  {
+    // The zone may have changed since the last second, on a device that travels. Other threads read what is set here.
+    const LockHold hold(zone_lock);
+    ::tzset();
+  }
   struct tm local {};
   if (localtime_r(&second, &local) == nullptr) return std::snprintf(out, room, "@%lld", static_cast<long long>(second));
   return std::snprintf(out, room, "%s %s %2d %02d:%02d:%02d %lld", kDays[local.tm_wday], kMonths[local.tm_mon],

@@ -59,12 +59,12 @@ TEST(ProcessStart, SettlesWhatTheDaemonRestsOn) {
 TEST(ProcessStart, RefusesTooFewDescriptors) {
   ScratchRoot root;
   const auto start = [] {
-    const rlimit few = {23, 23};
+    const rlimit few = {39, 39};
     ::setrlimit(RLIMIT_NOFILE, &few);
     return platform::start_process(kService);
   };
   EXPECT_EXIT(std::exit(start()), ExitedWithCode(71),
-              "^quorveld: a limit of 23 descriptors is too low, 24 are needed\n$");
+              "^quorveld: a limit of 39 descriptors is too low, 40 are needed\n$");
 }
 
 // Numbers beyond what was passed are the daemon's own, opened later, and never taken for a passed socket.

@@ -133,7 +133,8 @@ double StressedDaemon::well_behaved_call() const {
   const client::Reply reply = client::Client().copy_regulatory_images();
   const double taken = milliseconds_since(start);
   EXPECT_FALSE(reply.error) << reply.error->description;
-  EXPECT_EQ(reply.value.get(HashedKey(kImageKey)).bytes().size(), image_size_);
+  EXPECT_EQ(reply.value.get(HashedKey(kImageKey)).bytes().size(), image_size_)
+      << descriptors_open(pid()) << " descriptors are open; " << root.read_file(kLogFile).substr(0, 2000);
   return taken;
 }
 

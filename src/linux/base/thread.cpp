@@ -1,6 +1,9 @@
 #include "linux/base/thread.h"
 
 #include <cstddef>
+#include <ctime>
+
+#include "linux/base/monotonic_clock.h"
 
 namespace quorvel::platform::host {
 
@@ -9,19 +12,21 @@ namespace {
 // The default depends on the shell that the daemon was started from. Nothing in the daemon recurses on input.
 constexpr std::size_t kStackSize = 1u << 20;
 
-constexpr long kPatienceNanoseconds = 500'000'000;
+constexpr std::int64_t kPatienceMilliseconds = 500;
 
 }  // namespace
 
-timespec end_of_patience() noexcept {
-  timespec now = {};
-  ::clock_gettime(CLOCK_MONOTONIC, &now);
-  const long nanoseconds = now.tv_nsec + kPatienceNanoseconds;
-  return {now.tv_sec + nanoseconds / 1'000'000'000, nanoseconds % 1'000'000'000};
-}
+std::int64_t end_of_patience() noexcept { return monotonic_milliseconds() + kPatienceMilliseconds; }
 
-bool join_thread(pthread_t thread, const timespec& deadline) noexcept {
-  return ::pthread_clockjoin_np(thread, nullptr, CLOCK_MONOTONIC, &deadline) == 0;
+// Asked again and again: the calls that wait until a given time go by a clock that may be set meanwhile, or are not
+// known to the thread sanitizer.
+bool join_thread(pthread_t thread, std::int64_t deadline) noexcept {
+  constexpr timespec kPause = {0, 1'000'000};
+  while (::pthread_tryjoin_np(thread, nullptr) != 0) {
+    if (monotonic_milliseconds() >= deadline) return false;
+    ::nanosleep(&kPause, nullptr);
+  }
+  return true;
 }
 
 int start_thread(pthread_t& thread, void* (*run)(void*), void* argument) noexcept {

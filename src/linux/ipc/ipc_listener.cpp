@@ -67,7 +67,7 @@ bool IpcListener::stop() noexcept {
   socket_.remove_file();
   // All of them at once, so that none hands a new connection to one that has ended.
   for (host::IpcWorker& worker : workers_) worker.begin_to_stop();
-  const timespec deadline = host::end_of_patience();
+  const std::int64_t deadline = host::end_of_patience();
   bool ended = true;
   for (host::IpcWorker& worker : workers_) ended &= worker.wait_for_end(deadline);
   return ended;

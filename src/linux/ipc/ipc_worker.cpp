@@ -63,7 +63,7 @@ void IpcWorker::begin_to_stop() noexcept {
   if (started_) ::eventfd_write(wake_.get(), 1);
 }
 
-bool IpcWorker::wait_for_end(const timespec& deadline) noexcept {
+bool IpcWorker::wait_for_end(std::int64_t deadline) noexcept {
   if (started_ && join_thread(thread_, deadline)) started_ = false;
   return !started_;
 }

@@ -38,7 +38,7 @@ class IpcWorker {
   void begin_to_stop() noexcept;
   /// Waits for the end of the thread, which was told to end. False when it has not ended by `deadline`: the worker and
   /// its listener must then be left to it.
-  [[nodiscard]] bool wait_for_end(const timespec& deadline) noexcept;
+  [[nodiscard]] bool wait_for_end(std::int64_t deadline) noexcept;
 
   /// Has the worker close a connection of the user who holds most, if there are still too many. Any thread.
   void ask_for_room() noexcept;
@@ -83,6 +83,7 @@ class IpcWorker {
   void accept_some() noexcept;
   [[nodiscard]] bool accept_one() noexcept;
   [[nodiscard]] bool introduce(Descriptor socket) noexcept;
+  [[nodiscard]] bool has_place_for_one_more() noexcept;
   void make_room() noexcept;
   [[nodiscard]] IpcConnection* first_to_give_way() noexcept;
   void hand_over(IpcConnection& connection) noexcept;

@@ -24,6 +24,8 @@ constexpr int kSmallSendRoom = 4096;
 
 constexpr int kAcceptsAtOnce = 16;
 
+constexpr std::size_t kAboveLimit = 4;
+
 }  // namespace
 
 void IpcWorker::listen() noexcept {
@@ -54,6 +56,10 @@ void IpcWorker::accept_some() noexcept {
 // Returns whether somebody came and is gone already. Everybody is let in, because only then it shows who they are; room
 // is made afterwards.
 bool IpcWorker::accept_one() noexcept {
+  if (!has_place_for_one_more()) {
+    rest();
+    return false;
+  }
   Descriptor socket(::accept4(listener_->descriptor(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
   if (socket) {
     const bool is_gone = introduce(std::move(socket));
@@ -104,6 +110,14 @@ bool IpcWorker::introduce(Descriptor socket) noexcept {
 void IpcWorker::ask_for_room() noexcept {
   must_make_room_.store(true);
   ::eventfd_write(wake_.get(), 1);
+}
+
+// Between a newcomer and the connection that gives way for it there are more than there may be, which the reserve of
+// descriptors bears for a few. Beyond them this worker waits for what others, whom it has asked, let go of.
+bool IpcWorker::has_place_for_one_more() noexcept {
+  const std::size_t most = client_connection_limit() + kAboveLimit;
+  if (listener_->connection_count() >= most) make_room();
+  return listener_->connection_count() < most;
 }
 
 // Closes a connection when there are more than there may be.

@@ -27,7 +27,7 @@ namespace quorvel::platform {
 namespace {
 
 constexpr rlim_t kMaximumDescriptors = 65536;
-constexpr rlim_t kFewestDescriptors = 24;
+constexpr rlim_t kFewestDescriptors = 40;
 
 // A file that took the number of a closed standard descriptor would receive what is meant for that.
 [[nodiscard]] bool fill_standard_descriptors() noexcept {
