@@ -23,6 +23,7 @@ using platform::host::ListeningSocket;
 std::string socket_path() { return std::string(wire::kServiceDirectory) + '/' + std::string(wire::kTelephonySocket); }
 
 ListeningSocket open_listener() {
+  platform::host::settle_passed_sockets();
   if (Descriptor passed = platform::host::take_passed_socket()) return ListeningSocket(std::move(passed));
   for (const char* directory : {"/run", wire::kServiceDirectory.data()}) {
     if (platform::make_directory(directory, 0755) != 0 && errno != EEXIST) fail(directory);

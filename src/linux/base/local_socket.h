@@ -32,8 +32,10 @@ void refuse_attached_descriptors(int listener) noexcept;
 class ListeningSocket {
  public:
   ListeningSocket() noexcept = default;
-  /// Takes over a listening socket from elsewhere; its file stays.
-  explicit ListeningSocket(Descriptor socket) noexcept : socket_(std::move(socket)) {}
+  /// Takes over a listening socket from elsewhere, which refuses attached descriptors from now on; its file stays.
+  explicit ListeningSocket(Descriptor socket) noexcept : socket_(std::move(socket)) {
+    refuse_attached_descriptors(socket_.get());
+  }
   ListeningSocket(ListeningSocket&& other) noexcept { *this = std::move(other); }
   ListeningSocket& operator=(ListeningSocket&& other) noexcept;
   ~ListeningSocket() { remove_file(); }

@@ -9,7 +9,8 @@ namespace quorvel::platform::host {
 
 namespace {
 
-// The default depends on the shell that the daemon was started from. Nothing in the daemon recurses on input.
+// The default depends on the shell that the daemon was started from. Values are walked by
+// recursion, to 512 levels at most.
 constexpr std::size_t kStackSize = 1u << 20;
 
 constexpr std::int64_t kPatienceMilliseconds = 500;

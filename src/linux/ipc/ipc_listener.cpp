@@ -34,7 +34,6 @@ bool IpcListener::set_service_name(std::string_view name) noexcept {
 
 int IpcListener::open_socket() noexcept {
   if (Descriptor passed = host::take_passed_socket()) {
-    host::refuse_attached_descriptors(passed.get());
     socket_ = host::ListeningSocket(std::move(passed));
     return 0;
   }
