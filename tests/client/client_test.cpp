@@ -1,6 +1,8 @@
 // The client library against services that misbehave, and the errors it reports.
 #include "quorvel/client.h"
 
+#include <sys/syscall.h>
+
 #include <future>
 
 #include "protocol/quorvel_protocol.h"
@@ -91,6 +93,24 @@ TEST_F(ClientTest, TellsHowAServiceMisbehaves) {
   EXPECT_EQ(descriptors_open(), before);
 }
 
+TEST_F(ClientTest, SendsACallThatNoSocketBufferHolds) {
+  const PropertyValue argument = test::data(std::string(4 << 20, 'x'));
+  Options options;
+  options.timeout = 100ms;
+  const Descriptor listener = listen_on(kService);
+  EXPECT_EQ(Client(options).call("operation", argument).error->code, ErrorCode::timed_out) << "nobody reads";
+  static_cast<void>(accept_from(listener));
+  std::thread service([&] {
+    SocketPeer connection = accept_from(listener);
+    std::this_thread::sleep_for(50ms);
+    const auto call = connection.receive();
+    EXPECT_TRUE(call && call->value == argument);
+    connection.send(frame_bytes(wire::FrameKind::reply, 1, "", text("answer")));
+  });
+  EXPECT_EQ(Client().call("operation", argument).value, text("answer"));
+  service.join();
+}
+
 TEST_F(ClientTest, TellsWhyThereIsNoService) {
   const auto error_of = [](const Options& options) {
     const Reply reply = Client(options).call("operation");
@@ -104,6 +124,14 @@ TEST_F(ClientTest, TellsWhyThereIsNoService) {
   EXPECT_EQ(error_of({.service = "../telvane"}), ErrorCode::invalid_argument);
   EXPECT_EQ(error_of({.service = std::string(200, 'x')}), ErrorCode::invalid_argument);
   EXPECT_EQ(Client().call(std::string(300, 'x')).error->code, ErrorCode::invalid_argument);
+  if (::geteuid() == 0) {
+    const Descriptor service = listen_on(kService);
+    root.set_mode(kSocket, 0600);
+    std::filesystem::permissions(root.outside(), std::filesystem::perms(0755));
+    ASSERT_EQ(::syscall(SYS_setresuid, -1, 12345, -1), 0);  // of this thread alone
+    EXPECT_EQ(error_of({}), ErrorCode::access_denied);
+    ASSERT_EQ(::syscall(SYS_setresuid, -1, 0, -1), 0);
+  }
   root.remove("/run");
   EXPECT_EQ(error_of({}), ErrorCode::service_absent);
 }

@@ -143,7 +143,7 @@ TEST(HardwareRegistry, PropertiesAreFilesOfTheEntry) {
   root.write_file(entry_path + "large", std::string((64u << 10) + 1, 'x'));
   root.write_file(entry_path + "child/name", "x");
   root.make_fifo(entry_path + "fifo");
-  root.make_link("/etc", entry_path + "link");
+  root.make_link("class", entry_path + "link");
   const RegistryEntry entry = RegistryEntry::open("IODeviceTree:/baseband");
   ASSERT_TRUE(entry);
   EXPECT_EQ(entry.copy_property("class"), data(std::string_view("\x02\0\0\0", 4)));

@@ -6,6 +6,7 @@
 #include <cstddef>
 
 #include "linux/base/local_socket.h"
+#include "linux/notifications/notification_server.h"
 #include "linux/process/service_manager.h"
 #include "platform/notification_center.h"
 #include "platform/process.h"
@@ -249,6 +250,21 @@ TEST_F(NotificationCenter, ASlowObserverIsToldHowManyItMissed) {
   }
   SocketPeer late = observer();
   EXPECT_EQ(late.receive()->serial, count);
+}
+
+// While the thread is busy with the first one, the second is posted and the end begins.
+TEST_F(NotificationCenter, DeliversWhatWasPostedJustBeforeTheEnd) {
+  std::vector<SocketPeer> peers;
+  for (int i = 0; i < 200; ++i) {
+    peers.push_back(observer());
+    ASSERT_TRUE(peers.back().receive());
+  }
+  post_notification(text("first"), nullptr);
+  EXPECT_EQ(peers[0].receive()->name, "first");
+  post_notification(text("last"), nullptr);
+  platform::host::notification_server().stop();
+  EXPECT_EQ(peers[0].receive()->name, "last");
+  EXPECT_TRUE(peers[0].is_closed());
 }
 
 }  // namespace

@@ -1,4 +1,7 @@
 // quorvelctl as a person and a script use it: what it prints where, and how it ends.
+#include <sys/resource.h>
+
+#include <csignal>
 #include <fstream>
 
 #include "support/program.h"
@@ -145,7 +148,8 @@ TEST_F(Quorvelctl, WritesPropertyListsThatItShows) {
   root.write_file("/etc/file.plist", "old");
   root.set_mode("/etc/file.plist", 0600);
   const std::string json = "{\n  \"A\": {\n    \"$data\": \"AAEC\"\n  },\n  \"B\": 2.0\n}\n";
-  EXPECT_EQ(run_to_end(control_program(), {"plist", "write", path}, json).status, 0);
+  const Outcome replaced = run_to_end(control_program(), {"plist", "write", path}, json);
+  EXPECT_EQ(std::pair(replaced.status, replaced.err), std::pair(0, std::string()));
   EXPECT_EQ(root.mode_of("/etc/file.plist"), 0600u);
   expect_calls({{{"plist", "show", path, "--json"}, 0, json}});
   const Outcome written = run_to_end(control_program(), {"plist", "write", "-"}, json);
@@ -153,6 +157,30 @@ TEST_F(Quorvelctl, WritesPropertyListsThatItShows) {
   for (const char* wrong : {"", "null", "{", "{\"$data\": 1}"})
     EXPECT_EQ(run_to_end(control_program(), {"plist", "write", path}, wrong).status, 2) << wrong;
   EXPECT_EQ(written.out, root.read_file("/etc/file.plist"));
+  EXPECT_EQ(run_to_end(control_program(), {"plist", "show", "/nothing"}).err,
+            "quorvelctl: cannot open /nothing: No such file or directory\n");
+}
+
+// A disk that takes no more is played by a limit on the size of files, which programs inherit.
+TEST_F(Quorvelctl, LeavesNothingBehindWhenAFileCannotBeWritten) {
+  const std::string folder = "/private/var/mobile/Library/Preferences";
+  root.write_plist(folder + "/com.example.plist", dictionary({}));
+  const std::string file = root.path(folder + "/com.example.plist");
+  std::signal(SIGXFSZ, SIG_IGN);
+  const rlimit little = {64, RLIM_INFINITY};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
+  const std::string large = "[0,1,2,3,4,5,6,7,8,9]";  // larger as a property list
+  const Outcome written = run_to_end(control_program(), {"plist", "write", file}, large);
+  const Outcome set = run_to_end(control_program(), {"preferences", "set", "com.example", "Key", large});
+  const rlimit any = {RLIM_INFINITY, RLIM_INFINITY};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &any), 0);
+  for (const Outcome& outcome : {written, set}) {
+    EXPECT_EQ(outcome.status, 3);
+    EXPECT_TRUE(outcome.err.starts_with("quorvelctl: cannot write ")) << outcome.err;
+  }
+  const std::filesystem::directory_iterator entries(root.path(folder)), end;
+  EXPECT_EQ(std::distance(entries, end), 1);
+  EXPECT_EQ(root.read_plist(folder + "/com.example.plist"), dictionary({}));
 }
 
 TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
