@@ -224,7 +224,7 @@ class FaultSweep : public testing::Test {
     EXPECT_GE(refused_starts, 5);
   }
 
-  [[nodiscard]] std::size_t log_size() const { return daemon.root.read_file(kLogFile).size(); }
+  [[nodiscard]] std::size_t log_size() const { return std::filesystem::file_size(daemon.root.path(kLogFile)); }
 
   // The next line fills the log.
   void fill_log() {

@@ -28,8 +28,9 @@ std::string without_head(const std::string& line) {
 }
 
 std::string content_of(const fs::path& path) {
-  std::ifstream file(path, std::ifstream::binary);
-  return {std::istreambuf_iterator<char>(file), {}};
+  std::ostringstream content;
+  content << std::ifstream(path, std::ifstream::binary).rdbuf();
+  return std::move(content).str();
 }
 
 std::vector<std::string> lines_of(const std::string& log) {
