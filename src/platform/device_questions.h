@@ -11,7 +11,7 @@ namespace quorvel::platform {
 
 struct DeviceQuestion {
   std::string_view name;
-  PropertyKind kind = PropertyKind::none;  ///< none: only packaging can answer, with a value of any kind
+  PropertyKind kind = PropertyKind::none;  ///< none: a value of any kind, which only packaging can give
   std::string_view unit = {};              ///< empty where the kind says it all
 };
 

@@ -4,6 +4,7 @@
 //   large-load lock     loads of property-list files above 64 MiB; may take the log lock
 //   notification lock   the notification center's ring; takes nothing
 //   IPC locks           the host layer's own; take nothing, never held while a request runs
+//   telephony lock      the last state that the telephony service pushed; takes nothing
 //   log lock            innermost: nothing is taken while it is held
 #pragma once
 

@@ -1,5 +1,6 @@
 // The telephony service as the daemon sees it. The service pushes its whole state with every notification, and queries
-// are answered from the last state received, so nothing here waits for anybody. Main thread only.
+// are answered from the last state received, so nothing here waits for anybody. The center belongs to the main thread,
+// queries to any.
 #pragma once
 
 #include <cstddef>
@@ -85,7 +86,11 @@ void bind_to_run_loop(TelephonyCenter* center, RunLoop* loop, RunLoopMode mode) 
 [[nodiscard]] bool add_telephony_observer(TelephonyCenter* center, void* context, TelephonyObserver observer,
                                           const PropertyValue& name) noexcept;
 
-/// A server connection for one run of queries; holds on to the state it was opened with.
+/// Takes `state`, a dictionary, for the last state received; none while the service is away. The center does so with
+/// each push, and a process without a center may do so with a state of its own. Any thread.
+void keep_telephony_state(PropertyValue state) noexcept;
+
+/// A server connection for one run of queries; holds on to the state it was opened with. Any thread.
 class TelephonyConnection {
  public:
   using Callback = void (*)(void* context) noexcept;
@@ -102,7 +107,7 @@ class TelephonyConnection {
   PropertyValue state_;
 };
 
-/// The SIM status last reported, a string, or none. Needs no connection.
+/// The SIM status last reported, a string, or none. Needs no connection. Any thread.
 [[nodiscard]] PropertyValue copy_sim_status() noexcept;
 
 }  // namespace quorvel::platform

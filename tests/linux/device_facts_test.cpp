@@ -1,10 +1,13 @@
 // The live answers, asked of machines that are described in a scratch root.
 #include <sys/utsname.h>
 
+#include <fstream>
+
 #include "linux/device/source_table.h"
 #include "linux/device/sources/machine_id.h"
 #include "platform/device_information.h"
 #include "platform/device_paths.h"
+#include "platform/telephony.h"
 #include "support/scratch_root.h"
 
 namespace quorvel::test {
@@ -84,14 +87,49 @@ const std::string kVirtualMachine = kTree + "compatible = linux,dummy-virt\\0\nm
                                     "eth0/address = 02:fc:00:00:00:01\neth0/addr_assign_type = 0\neth0/type = 1\n"
                                     "eth0/ifindex = 4\neth0/device/x = \n";
 
+// The page on device facts: the cells behind each question of its table, and the questions of its list.
+struct Page {
+  std::map<std::string, std::vector<std::string>, std::less<>> table;
+  std::set<std::string, std::less<>> list;
+
+  Page() {
+    std::ifstream file(QUORVEL_SOURCE_DIR "/docs/device-facts.md");
+    for (std::string line; std::getline(file, line);) {
+      if (line.starts_with("- `") && line.ends_with('`')) list.insert(line.substr(3, line.size() - 4));
+      if (!line.starts_with("| `")) continue;
+      std::vector<std::string> cells;
+      std::istringstream columns(line.substr(2));
+      for (std::string cell; std::getline(columns, cell, '|');) {
+        const std::size_t start = std::min(cell.find_first_not_of(' '), cell.size());
+        cells.push_back(cell.substr(start, cell.find_last_not_of(' ') + 1 - start));
+      }
+      const std::string question = cells.at(0).substr(1, cells.at(0).size() - 2);
+      cells.erase(cells.begin());
+      table.emplace(question, std::move(cells));
+    }
+  }
+
+  // An origin is a path whose last component, or whose folder, the page names, or a source in words.
+  [[nodiscard]] bool tells(std::string_view question, std::string_view origin) const {
+    const auto row = table.find(question);
+    if (row == table.end()) return false;
+    const auto names = [&](std::string_view place) { return row->second.at(2).find(place) != std::string::npos; };
+    const std::size_t slash = origin.rfind('/');
+    if (slash == std::string_view::npos) return names(origin.substr(origin.rfind(' ') + 1));
+    return names(origin.substr(slash + 1)) || names(origin.substr(0, slash));
+  }
+};
+
 // What the machine answers, one "QUESTION = VALUE" each; nothing else may have an answer.
 std::map<std::string, std::string> answers() {
+  static const Page page;
   std::map<std::string, std::string> all;
   for (const DeviceQuestion& question : kDeviceQuestions) {
     const DeviceAnswer answer = copy_device_answer_with_origin(question.name);
     EXPECT_EQ(static_cast<bool>(answer.value), static_cast<bool>(answer.origin)) << question.name;
     if (!answer.value || question.name == "CPUArchitecture") continue;
     EXPECT_EQ(answer.value.kind(), question.kind) << question.name;
+    EXPECT_TRUE(page.tells(question.name, answer.origin.text())) << question.name << ' ' << answer.origin.text();
     const PropertyValue& value = answer.value;
     all.emplace(question.name, value.is_string()                       ? std::string(value.text())
                                : value.kind() == PropertyKind::boolean ? (value.to_boolean() ? "true" : "false")
@@ -101,6 +139,23 @@ std::map<std::string, std::string> answers() {
 }
 
 using Answers = std::map<std::string, std::string>;
+
+TEST(DeviceFacts, StandInTheDocument) {
+  const Page page;
+  for (const DeviceQuestion& question : kDeviceQuestions) {
+    const bool is_answered = std::ranges::any_of(
+        host::kQuestionSources, [&question](const auto& row) { return row.question == question.name; });
+    EXPECT_EQ(page.list.contains(question.name), !is_answered) << question.name;
+    EXPECT_EQ(page.table.contains(question.name), is_answered) << question.name;
+    if (!is_answered || !page.table.contains(question.name)) continue;
+    const std::vector<std::string>& cells = page.table.find(question.name)->second;
+    const std::map<PropertyKind, std::string> kinds = {
+        {PropertyKind::boolean, "boolean"}, {PropertyKind::integer, "integer"}, {PropertyKind::string, "text"}};
+    EXPECT_EQ(cells.at(0), kinds.at(question.kind)) << question.name;
+    EXPECT_EQ(cells.at(1), question.unit) << question.name;
+  }
+  EXPECT_EQ(page.list.size() + page.table.size(), kDeviceQuestionCount);
+}
 
 TEST(DeviceFacts, APhoneIsDescribedByItsDeviceTree) {
   ScratchRoot root;
@@ -230,6 +285,48 @@ TEST(DeviceFacts, AHostileFileIsAMissingFact) {
   root.make_directory("/sys/class/dmi/id/product_sku");
   root.make_link("/sys/class/power_supply", "/sys/class/power_supply");
   EXPECT_EQ(answers(), Answers{});
+}
+
+TEST(DeviceFacts, WhatNobodyMayReadIsNoFact) {
+  ScratchRoot root;
+  unfold(root, kDmi + "product_serial = PF1ABCDE\nproduct_name = Book\n");
+  root.set_mode("/sys/class/dmi/id/product_serial", 0000);
+  EXPECT_EQ(answers().count("SerialNumber"), ::geteuid() == 0 ? 1u : 0u) << "root may read it";
+  ASSERT_EQ(::geteuid() == 0 ? ::seteuid(65534) : 0, 0);
+  EXPECT_EQ(answers(), (Answers{{"ProductType", "Book"}, {"HWModelStr", "Book"}, {"marketing-name", "Book"}}));
+  static_cast<void>(::seteuid(::getuid()));
+}
+
+TEST(DeviceFacts, TheTelephonyServicesLastStateAnswers) {
+  const ScratchRoot root;
+  const auto value = [](const Value& given) { return dictionary({{"Value", given}}); };
+  const PropertyValue radio =
+      value(dictionary({{"Status", "NotReady"}, {"InternationalMobileEquipmentIdentity", " 490154203237518\n"}}));
+  const struct {
+    PropertyValue state;
+    Answers expected;
+  } cases[] = {
+      {dictionary({{"imsi", value("262015099999999")}, {"firmware-version", value("1.2")}, {"postponement", radio}}),
+       {{"BasebandFirmwareVersion", "1.2"},
+        {"BasebandPostponementStatus", "NotReady"},
+        {"InternationalMobileEquipmentIdentity", "490154203237518"},
+        {"MobileSubscriberCountryCode", "262"}}},
+      {dictionary({{"imsi", value("26201509999999x")},
+                   {"firmware-version", value("1\x1b[2J")},
+                   {"postponement", value("Ready")}}),
+       {}},
+      {dictionary({{"imsi", value("26201")},
+                   {"firmware-version", value(7)},
+                   {"postponement", value(dictionary({{"Status", true}}))}}),
+       {}},
+      {dictionary({{"imsi", dictionary({{"Value", "262015099999999"}, {"Domain", 1}, {"Code", 2}})}}), {}},
+      {dictionary({{"firmware-version", value("1.2")}, {"connection", dictionary({{"Code", 1}})}}), {}},
+      {nullptr, {}},
+  };
+  for (const auto& [state, expected] : cases) {
+    keep_telephony_state(state);
+    EXPECT_EQ(answers(), expected) << described(state);
+  }
 }
 
 TEST(DeviceFacts, TheIdentifierIsTheOneThatOtherToolsDerive) {

@@ -6,7 +6,6 @@
 #include "platform/process.h"
 #include "quorvel/observer.h"
 #include "store/data_ark_record.h"
-#include "store/live_answers.h"
 #include "store/standard_key_classes.h"
 #include "support/scratch_root.h"
 
@@ -339,49 +338,6 @@ TEST(DataArkFile, AFileThatCouldNotBeUsedIsNeverDestroyed) {
     root.expect_log({is_gone ? "data_ark_store: saved" : refusal});
     EXPECT_EQ(root.read_file(kFile) == "garbage", !is_gone);
   }
-}
-
-TEST(LiveAnswers, EveryRowIsFoundByItsOwnDomainAndKeyOnly) {
-  for (const larry_info& row : kLiveAnswers) {
-    const PropertyValue domain = row.domain.empty() ? PropertyValue{} : text(row.domain);
-    ASSERT_EQ(find_live_answer(domain, text(row.key)), &row) << row.key;
-    EXPECT_EQ(find_live_answer(text("other"), text(row.key)), nullptr);
-    EXPECT_EQ(find_live_answer(text(""), text(row.key)), nullptr) << "an empty domain is a domain";
-    EXPECT_EQ(find_live_answer(domain, text(std::string(row.key) + "x")), nullptr);
-    EXPECT_EQ(larry_lookup(domain, text(row.key), 0), text(row.question));
-    EXPECT_TRUE(larry_lookup(domain, text(row.key), 1)
-                    .text()
-                    .ends_with(row.question_name.empty() ? row.question : row.question_name));
-    EXPECT_FALSE(larry_lookup(domain, text(row.key), 2));
-  }
-  EXPECT_EQ(find_live_answer(nullptr, text("BatteryIsCharging")), nullptr);
-  EXPECT_EQ(find_live_answer(nullptr, nullptr), nullptr);
-  EXPECT_EQ(find_live_answer(nullptr, text("")), nullptr);
-  EXPECT_EQ(find_live_answer(PropertyValue::integer(1), text("DieID")), &kLiveAnswers[37]) << "no string is no domain";
-}
-
-TEST(LiveAnswers, AreAskedAnewAndNeverStored) {
-  ScratchRoot root;
-  root.make_directory(kStateDirectory);
-  DataArk* ark = load_kept_ark();
-  const auto answer = [&](const char* version) {
-    root.write_plist("/etc/quorvel/device_information.plist", dictionary({{"ProductVersion", version}}));
-    return data_ark_copy(ark, nullptr, text("ProductVersion"));
-  };
-  data_ark_set(ark, nullptr, text("ProductVersion"), text("stored"));
-  data_ark_set(ark, nullptr, text("MarketingName"), text("stored"));
-  static_cast<void>(root.log_lines());
-  EXPECT_EQ(answer("1.0"), text("1.0"));
-  EXPECT_EQ(answer("1.1"), text("1.1"));
-  EXPECT_EQ(data_ark_exists(ark, nullptr, text("ProductVersion")), 1);
-  EXPECT_EQ(data_ark_exists(ark, nullptr, text("DieID")), 0);
-  EXPECT_FALSE(data_ark_copy(ark, nullptr, text("MarketingName")));
-  EXPECT_FALSE(data_ark_copy(ark, nullptr, text("DieID")));
-  root.expect_log(
-      {"data_ark_copy_with_conn_state: the device-information service returned nothing for "
-       "kVeritomeQMarketingNameString",
-       "data_ark_copy_with_conn_state: the device-information service returned nothing for "
-       "kVeritomeQDieId"});
 }
 
 }  // namespace quorvel::test

@@ -2,6 +2,7 @@
 
 #include <pwd.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cmath>
@@ -13,6 +14,8 @@
 #include <sstream>
 
 #include "client/core/service_socket.h"
+#include "platform/device_paths.h"
+#include "platform/file_system.h"
 
 namespace quorvel::tools {
 namespace {
@@ -54,6 +57,13 @@ Server server_of(std::string_view service) {
   socklen_t size = sizeof peer;
   if (::getsockopt(socket.descriptor(), SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) peer = {};
   return {Server::State::serving, peer.pid, peer.uid, {}};
+}
+
+bool is_believed(const Server& service) {
+  struct stat directory {};
+  if (service.state != Server::State::serving) return false;
+  if (service.user == 0) return true;
+  return platform::file_status(paths::kServiceDirectory, &directory) == 0 && service.user == directory.st_uid;
 }
 
 std::string user_name(uid_t user) {

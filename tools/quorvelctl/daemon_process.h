@@ -21,6 +21,9 @@ struct Server {
 /// Connects to `service` (its socket's name without the extension) and leaves again.
 [[nodiscard]] Server server_of(std::string_view service);
 
+/// True for a telephony service that the daemon would believe: one of root, or of the service directory's owner.
+[[nodiscard]] bool is_believed(const Server& service);
+
 /// A user's name, or the number of one without a name.
 [[nodiscard]] std::string user_name(uid_t user);
 

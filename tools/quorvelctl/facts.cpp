@@ -12,6 +12,7 @@
 #include "facts_text.h"
 #include "live_answer.h"
 #include "output.h"
+#include "telephony_look.h"
 
 namespace quorvel::tools {
 namespace {
@@ -41,6 +42,7 @@ Rows chosen_rows(const std::vector<std::string>& keys) {
 }
 
 std::vector<LiveAnswer> ask(const Rows& rows) {
+  look_at_telephony();
   std::vector<LiveAnswer> facts;
   for (const larry_info* row : rows) facts.push_back(live_answer(*row));
   return facts;
@@ -117,8 +119,8 @@ void add_facts(CLI::App& app, CommandLine& line) {
             "  quorvelctl facts --watch 5 BatteryCurrentCapacity\n"
             "  quorvelctl facts --json | jq -r '.[].key'",
             "Asks the device in this process, as the caller and outside the daemon's sandbox: the daemon may "
-            "see less, and root sees more. Packaging's answers in /etc/quorvel/device_information.plist win "
-            "over everything.\n\n"
+            "see less, and root sees more. What the telephony service tells counts as well, and packaging's "
+            "answers in /etc/quorvel/device_information.plist win over everything.\n\n"
             "Exit status: 1 when nothing that was asked for has an answer."});
   auto words = std::make_shared<FactWords>();
   command->add_flag("--all", words->all, "Also the keys without an answer");

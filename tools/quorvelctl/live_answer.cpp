@@ -3,6 +3,7 @@
 #include "platform/device_information.h"
 #include "platform/device_questions.h"
 #include "store/live_answers.h"
+#include "telephony_look.h"
 
 namespace quorvel::tools {
 namespace {
@@ -18,7 +19,9 @@ std::string_view unit_of(std::string_view name) {
 LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::string& key) {
   const larry_info* row =
       find_live_answer(has_domain ? PropertyValue::string(domain) : PropertyValue(), PropertyValue::string(key));
-  return row == nullptr ? LiveAnswer() : live_answer(*row);
+  if (row == nullptr) return {};
+  look_at_telephony();
+  return live_answer(*row);
 }
 
 LiveAnswer live_answer(const larry_info& row) {

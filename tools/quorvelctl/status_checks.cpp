@@ -44,15 +44,13 @@ bool exists(const char* path, struct stat* status) { return platform::file_statu
 
 // Why the daemon does not follow the service that is there or should be, as far as one sees from outside.
 std::string why_not_followed(const Server& service, bool marked) {
-  struct stat directory {};
   if (service.state == Server::State::absent) {
     struct stat socket {};
     return exists(kSocket, &socket) ? std::string("nobody serves ") + kSocket + ", which is there"
                                     : std::string("nothing is at ") + kSocket + ": the service does not run";
   }
-  const bool foreign = service.state == Server::State::serving && exists(paths::kServiceDirectory, &directory) &&
-                       service.user != 0 && service.user != directory.st_uid;
-  if (foreign) return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
+  if (service.state == Server::State::serving && !is_believed(service))
+    return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
   if (!marked)
     return std::string("the daemon may have started without it: make ") + paths::kTelephonyMark +
            " and restart the daemon";

@@ -18,6 +18,8 @@ struct QuestionSources {
 
 inline constexpr QuestionSources kQuestionSources[] = {
     {"AirplaneMode", {airplane_mode}},
+    {"BasebandFirmwareVersion", {baseband_firmware}},
+    {"BasebandPostponementStatus", {radio_status}},
     {"BatteryCurrentCapacity", {battery_percentage}},
     {"BatteryIsCharging", {battery_is_charging}},
     {"BatteryIsFullyCharged", {battery_is_full}},
@@ -32,7 +34,9 @@ inline constexpr QuestionSources kQuestionSources[] = {
     {"HWModelStr", {device_tree_board, dmi_board_name, dmi_product_name}},
     {"HardwarePlatform", {device_tree_platform, chip_family}},
     {"HasBaseband", {has_modem, device_tree_baseband}},
+    {"InternationalMobileEquipmentIdentity", {equipment_identity}},
     {"MLBSerialNumber", {dmi_board_serial}},
+    {"MobileSubscriberCountryCode", {subscriber_country}},
     {"ModelNumber", {hardware_sku_of_administrator, dmi_product_sku}},
     {"ProductType", {device_tree_board, dmi_product_name}},
     {"ProductVersion", {system_version}},

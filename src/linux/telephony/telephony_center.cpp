@@ -139,7 +139,7 @@ bool TelephonyCenter::handle(const wire::Frame& frame) noexcept {
     stream_.tell_unusable(frame);
     return false;
   }
-  state_ = std::move(state);
+  keep_telephony_state(std::move(state));
   delay_ = kFirstDelay;
   say("Listening; following the telephony service");
   if (frame.head.kind == wire::FrameKind::event) deliver(frame.name);
@@ -157,7 +157,7 @@ void TelephonyCenter::deliver(std::string_view name) noexcept {
 void TelephonyCenter::lose_service() noexcept {
   loop_->remove(stream_source_);
   stream_.close();
-  state_ = nullptr;
+  keep_telephony_state(nullptr);
   say("Listening; the telephony service is gone");
   schedule_try();
 }
@@ -184,8 +184,6 @@ void TelephonyCenter::try_again(void* context) noexcept {
   center.watch_directory();
   center.look_for_service();
 }
-
-TelephonyCenter* existing_telephony_center() noexcept { return the_center; }
 
 TelephonyCenter* default_telephony_center() noexcept {
   if (asked_before) return the_center;

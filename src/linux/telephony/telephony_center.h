@@ -1,4 +1,4 @@
-// The telephony service's notification center: the last state that the service pushed, and who observes it.
+// The telephony service's notification center: follows the service, and tells who observes it.
 #pragma once
 
 #include <cstddef>
@@ -22,9 +22,6 @@ class TelephonyCenter {
   /// Has everything served by `loop`, and looks for the service for the first time.
   void bind(RunLoop* loop) noexcept;
   [[nodiscard]] bool add_observer(void* context, TelephonyObserver observer, const PropertyValue& name) noexcept;
-
-  /// The last state received, a dictionary; none while the service is away.
-  [[nodiscard]] const PropertyValue& state() const noexcept { return state_; }
 
  private:
   struct Observer {
@@ -56,12 +53,8 @@ class TelephonyCenter {
   RunLoop* loop_ = nullptr;
   const char* status_ = nullptr;  // as the service manager was told last
   int delay_ = 0;                 // milliseconds before the next attempt to connect
-  PropertyValue state_;
   Observer* first_observer_ = nullptr;
   Observer** last_link_ = &first_observer_;
 };
-
-/// The default center if it exists already. Borrowed, null otherwise. Main thread.
-[[nodiscard]] TelephonyCenter* existing_telephony_center() noexcept;
 
 }  // namespace quorvel::platform

@@ -149,6 +149,13 @@ std::optional<std::uint64_t> parse_chip_number(std::string_view text) noexcept {
   return whole_number<std::uint64_t>(text, 10);
 }
 
+std::string_view country_code(std::string_view identity) noexcept {
+  // The network's two or three digits and at least one of the subscriber's follow.
+  const bool is_identity = identity.size() >= 6 && identity.size() <= 15;
+  return is_identity && identity.find_first_not_of("0123456789") == kNowhere ? identity.substr(0, 3)
+                                                                             : std::string_view{};
+}
+
 bool is_network_address(std::string_view text) noexcept {
   if (text.size() != kAddressLength) return false;
   bool is_zero = true;

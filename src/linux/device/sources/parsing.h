@@ -23,6 +23,10 @@ namespace quorvel::platform::host {
 /// Decimal digits, or hexadecimal ones behind "0x", that fit 64 bits.
 [[nodiscard]] std::optional<std::uint64_t> parse_chip_number(std::string_view text) noexcept;
 
+/// The three digits with which a subscriber's identity begins, the country's; empty when it is none. A view into
+/// `identity`.
+[[nodiscard]] std::string_view country_code(std::string_view identity) noexcept;
+
 /// True for the lower-case text of a unicast address other than all zeros.
 [[nodiscard]] bool is_network_address(std::string_view text) noexcept;
 inline constexpr std::size_t kAddressLength = 17;

@@ -1,6 +1,5 @@
 // The sources of live answers. Each function reads one thing anew and gives an answer with its origin, or none; any
-// thread may call it. A new fact is a function in the file of its kernel subsystem, and its name in the table of
-// device_information.cpp.
+// thread may call it. A new fact is a function in the file of what knows it, and its name in source_table.h.
 #pragma once
 
 #include "platform/device_information.h"
@@ -52,6 +51,12 @@ namespace quorvel::platform::host {
 [[nodiscard]] DeviceAnswer has_wireless() noexcept;
 [[nodiscard]] DeviceAnswer has_modem() noexcept;
 [[nodiscard]] DeviceAnswer bluetooth_address() noexcept;
+
+// telephony.cpp
+[[nodiscard]] DeviceAnswer baseband_firmware() noexcept;
+[[nodiscard]] DeviceAnswer equipment_identity() noexcept;
+[[nodiscard]] DeviceAnswer radio_status() noexcept;
+[[nodiscard]] DeviceAnswer subscriber_country() noexcept;
 
 // power_supply.cpp
 [[nodiscard]] DeviceAnswer battery_is_charging() noexcept;
