@@ -6,6 +6,8 @@ declare -A packages=(
   [build]="g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev"
   # To build the bridge to ModemManager, and to test it on the real one.
   [bridge]="libsystemd-dev modemmanager dbus-daemon"
+  # To cut the power of a disk: one whose content a process serves, and the file systems on it.
+  [powercut]="libfuse3-dev e2fsprogs xfsprogs btrfs-progs"
   [clang]="clang"
   [lint]="clang clang-format clang-tidy shellcheck"
   [coverage]="clang llvm"
