@@ -18,15 +18,34 @@ void FrameInput::arrived(std::size_t count) noexcept {
   static_cast<void>(bytes_.resize(bytes_.size() + count));
 }
 
+bool FrameInput::borrow(std::span<const std::byte> bytes) noexcept {
+  if (!bytes_.empty()) return bytes_.append(bytes.data(), bytes.size());
+  borrowed_ = bytes;
+  return true;
+}
+
+bool FrameInput::keep() noexcept {
+  const std::span<const std::byte> borrowed = std::exchange(borrowed_, {});
+  bytes_.consume(std::exchange(taken_, 0));
+  if (bytes_.empty() && borrowed.empty()) bytes_.clear(0);
+  return bytes_.append(borrowed.data(), borrowed.size());
+}
+
 FrameResult FrameInput::next(std::uint32_t maximum_body, Frame& frame) noexcept {
-  const FrameResult result = parse_frame(bytes_.bytes().subspan(taken_), maximum_body, frame);
-  if (result == FrameResult::complete) taken_ += kFrameHeadSize + frame.head.body_length;
+  const FrameResult result = parse_frame(rest(), maximum_body, frame);
+  if (result != FrameResult::complete) return result;
+  const std::size_t size = kFrameHeadSize + frame.head.body_length;
+  if (borrowed_.empty()) {
+    taken_ += size;
+  } else {
+    borrowed_ = borrowed_.subspan(size);
+  }
   return result;
 }
 
 FrameResult FrameInput::look(std::uint32_t maximum_body) const noexcept {
   Frame frame;
-  return parse_frame(bytes_.bytes().subspan(taken_), maximum_body, frame);
+  return parse_frame(rest(), maximum_body, frame);
 }
 
 }  // namespace quorvel::wire

@@ -13,7 +13,4 @@ namespace quorvel::platform::host {
 /// True for an error of accept(2) that lasts until descriptors or memory are free again.
 [[nodiscard]] bool is_exhaustion(int error) noexcept;
 
-/// How long a listener that ran into a limit rests at most.
-inline constexpr int kAcceptRestMilliseconds = 50;
-
 }  // namespace quorvel::platform::host

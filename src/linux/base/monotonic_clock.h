@@ -1,7 +1,9 @@
 #pragma once
 
+#include <algorithm>
 #include <cstdint>
 #include <ctime>
+#include <limits>
 
 namespace quorvel::platform::host {
 
@@ -17,6 +19,13 @@ namespace quorvel::platform::host {
   timespec now;
   ::clock_gettime(CLOCK_MONOTONIC, &now);
   return std::int64_t{now.tv_sec} * 1'000'000 + now.tv_nsec / 1'000;
+}
+
+/// How long a wait that ends at `due` on that clock may last, in milliseconds: at least 1, as the clock may be that
+/// much behind, and half a minute at most; -1, for ever, when `due` is the largest number.
+[[nodiscard]] inline int milliseconds_until(std::int64_t due) noexcept {
+  if (due == std::numeric_limits<std::int64_t>::max()) return -1;
+  return static_cast<int>(std::clamp<std::int64_t>(due - monotonic_milliseconds(), 1, 30'000));
 }
 
 }  // namespace quorvel::platform::host

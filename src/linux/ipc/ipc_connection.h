@@ -6,11 +6,11 @@
 #include <span>
 
 #include "linux/base/intrusive_list.h"
-#include "linux/base/user_shares.h"
+#include "linux/base/places.h"
 #include "platform/descriptor.h"
 #include "platform/ipc.h"
 #include "property/byte_buffer.h"
-#include "wire/frame.h"
+#include "wire/frame_input.h"
 #include "wire/shared_bytes.h"
 #include "wire/waiting_replies.h"
 
@@ -29,15 +29,8 @@ struct IpcOutgoing {
 
 class IpcConnection : public host::ListLink {
  public:
-  /// What the worker waits for; each stage has a list of its own, in the order of `since`.
-  enum class Stage : std::uint8_t {
-    fresh,    // the first byte of its first call
-    idle,     // the first byte of a call
-    partial,  // the rest of a call
-    ready,    // its turn: a whole call is there
-    sending,  // the client to take the rest of a reply
-    closed    // the end of the batch of events that it was closed in
-  };
+  /// What the worker waits for (ipc_stages.h).
+  enum class Stage : std::uint8_t { fresh, idle, partial, ready, sending, closed };
 
   explicit IpcConnection(Descriptor socket) noexcept
       : socket_(std::move(socket)), peer_(host::peer_of(socket_.get())) {}
@@ -64,12 +57,13 @@ class IpcConnection : public host::ListLink {
 
   /// The worker's notes.
   Stage stage = Stage::fresh;
-  bool input_ended = false;
+  bool input_ended = false;  // the client sends nothing more
   bool has_called = false;
   std::uint32_t interest = 0;
-  std::int64_t since = 0;
-  ByteBuffer input;
-  std::size_t counted_input = 0;  // of `input`, what the listener has counted
+  std::int64_t since = 0;  // when the stage began
+  wire::FrameInput input;
+  wire::Frame call = {};        // taken off the input, for `ready` to run; lies in it
+  std::size_t noted_input = 0;  // how much of the input is noted with the user's place
 
  private:
   void finish_reply(bool complete) noexcept;

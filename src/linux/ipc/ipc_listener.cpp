@@ -77,12 +77,6 @@ bool IpcListener::accepts(IpcConnection& connection) noexcept {
          connection.is_resumed();
 }
 
-std::size_t IpcListener::connection_count() const noexcept {
-  std::size_t count = 0;
-  for (std::size_t i = 0; i < worker_count_; ++i) count += workers_[i].connection_count();
-  return count;
-}
-
 host::IpcWorker& IpcListener::least_loaded() noexcept {
   return *std::min_element(workers_, workers_ + worker_count_,
                            [](const host::IpcWorker& left, const host::IpcWorker& right) {
@@ -94,11 +88,6 @@ void IpcListener::ask_others_for_room(const host::IpcWorker& worker) noexcept {
   for (std::size_t i = 0; i < worker_count_; ++i) {
     if (&workers_[i] != &worker) workers_[i].ask_for_room();
   }
-}
-
-void IpcListener::count_input(IpcConnection& connection) noexcept {
-  const std::size_t before = std::exchange(connection.counted_input, connection.input.size());
-  held_input_.fetch_add(connection.counted_input - before, std::memory_order_relaxed);
 }
 
 IpcListener* create_listener(std::string_view service_name) noexcept {

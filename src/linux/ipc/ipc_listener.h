@@ -1,11 +1,12 @@
 // A listener of the IPC service with its socket and its workers.
 #pragma once
 
-#include <atomic>
 #include <cstddef>
 #include <string_view>
 
+#include "linux/base/connection_limit.h"
 #include "linux/base/local_socket.h"
+#include "linux/base/places.h"
 #include "linux/ipc/ipc_worker.h"
 #include "platform/ipc.h"
 #include "wire/waiting_replies.h"
@@ -31,18 +32,18 @@ class IpcListener {
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
   [[nodiscard]] wire::WaitingReplies& waiting_replies() noexcept { return waiting_replies_; }
   [[nodiscard]] bool accepts(IpcConnection& connection) noexcept;
-  [[nodiscard]] std::size_t connection_count() const noexcept;
   [[nodiscard]] host::IpcWorker& least_loaded() noexcept;
-  [[nodiscard]] host::UserShares& shares() noexcept { return shares_; }
-  /// Wakes the workers other than `worker` to make room: it has no connection of the user who holds most.
+  /// Who holds the places of all workers' connections, and the bytes of calls that are not whole yet.
+  [[nodiscard]] host::Places& places() noexcept { return places_; }
+  /// Wakes the workers other than `worker` to make room: it has none of the connections that should give way.
   void ask_others_for_room(const host::IpcWorker& worker) noexcept;
-  /// The bytes that all connections together hold of calls that are not whole yet.
-  [[nodiscard]] std::size_t held_input() const noexcept { return held_input_.load(std::memory_order_relaxed); }
-  void count_input(IpcConnection& connection) noexcept;
 
  private:
   static constexpr std::size_t kMinimumWorkers = 2;
   static constexpr std::size_t kMaximumWorkers = 4;
+
+  // What connections may hold of calls that are not whole yet, all of them together.
+  static constexpr std::size_t kHeldInputBudget = 4u << 20;
 
   [[nodiscard]] int open_socket() noexcept;
   [[nodiscard]] int start_workers() noexcept;
@@ -51,8 +52,7 @@ class IpcListener {
   IpcDelegate delegate_ = {};
   host::ListeningSocket socket_;
   wire::WaitingReplies waiting_replies_;
-  host::UserShares shares_;
-  std::atomic<std::size_t> held_input_ = 0;
+  host::Places places_{host::client_connection_limit, kHeldInputBudget};
   std::size_t worker_count_ = 0;  // settled before the first worker starts
   host::IpcWorker workers_[kMaximumWorkers];
 };

@@ -1,15 +1,12 @@
 #include "linux/ipc/ipc_worker.h"
 
 #include <sched.h>
-#include <sys/eventfd.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <utility>
 
-#include "linux/base/connection_limit.h"
 #include "linux/base/monotonic_clock.h"
 #include "linux/base/thread.h"
 #include "linux/ipc/ipc_listener.h"
@@ -18,18 +15,11 @@ namespace quorvel::platform::host {
 
 namespace {
 
-// How long a client may take over a call from its first byte, and over taking a whole reply.
-constexpr std::int64_t kCallMilliseconds = 10'000;
-constexpr std::int64_t kReplyMilliseconds = 30'000;
-
 // How long a thread that ends goes on for calls that are under way.
 constexpr std::int64_t kFinishMilliseconds = 100;
 
 // How long a thread stays awake for the next call of a client that called before.
 constexpr std::int64_t kAwakeMicroseconds = 50;
-
-// What connections may hold of calls that are not whole yet, all of them together.
-constexpr std::size_t kHeldInputBudget = 4u << 20;
 
 constexpr int kEventsAtOnce = 64;
 
@@ -37,19 +27,16 @@ constexpr int kEventsAtOnce = 64;
 
 IpcWorker::~IpcWorker() {
   take_in_handed_over();
-  close_all();
+  for (const Stage stage : {Stage::fresh, Stage::idle, Stage::partial, Stage::ready, Stage::sending}) {
+    while (IpcConnection* connection = stages_.oldest(stage)) close(*connection);
+  }
+  free_closed();
 }
 
 bool IpcWorker::prepare(IpcListener& listener) noexcept {
   listener_ = &listener;
   outgoing_.waiting = &listener.waiting_replies();
-  epoll_ = Descriptor(::epoll_create1(EPOLL_CLOEXEC));
-  wake_ = Descriptor(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
-  if (!epoll_ || !wake_) return false;
-  epoll_event event = {};
-  event.events = EPOLLIN;
-  event.data.ptr = &wake_;
-  return ::epoll_ctl(epoll_.get(), EPOLL_CTL_ADD, wake_.get(), &event) == 0;
+  return queue_.open_with_bell();
 }
 
 bool IpcWorker::start() noexcept {
@@ -60,7 +47,7 @@ bool IpcWorker::start() noexcept {
 
 void IpcWorker::begin_to_stop() noexcept {
   stopping_.store(true, std::memory_order_release);
-  if (started_) ::eventfd_write(wake_.get(), 1);
+  if (started_) queue_.ring();
 }
 
 bool IpcWorker::wait_for_end(std::int64_t deadline) noexcept {
@@ -76,7 +63,7 @@ void* IpcWorker::run_thread(void* worker) noexcept {
 
 void IpcWorker::run() noexcept {
   epoll_event events[kEventsAtOnce];
-  listen();
+  acceptor_.open(*listener_, queue_);
   while (!stopping_.load(std::memory_order_acquire)) {
     const int count = wait_for_events(events);
     now_ = monotonic_milliseconds();
@@ -84,7 +71,7 @@ void IpcWorker::run() noexcept {
     serve_ready();
     close_overdue();
     free_closed();
-    if (listen_again_ != 0 && now_ >= listen_again_) listen();
+    acceptor_.wake_when_due(now_);
   }
   finish();
 }
@@ -93,14 +80,13 @@ void IpcWorker::run() noexcept {
 // service that is started again loses no call, because those that were not let in wait in the socket for the next one.
 void IpcWorker::finish() noexcept {
   epoll_event events[kEventsAtOnce];
-  ::epoll_ctl(epoll_.get(), EPOLL_CTL_DEL, listener_->descriptor(), nullptr);
+  acceptor_.close();
   take_in_handed_over();
   const std::int64_t end = monotonic_milliseconds() + kFinishMilliseconds;
   for (now_ = monotonic_milliseconds(); has_calls_under_way() && now_ < end; now_ = monotonic_milliseconds()) {
-    const int limit = list_of(Stage::ready).empty() ? static_cast<int>(end - now_) : 0;
-    const int count = ::epoll_wait(epoll_.get(), events, kEventsAtOnce, limit);
+    const int count = queue_.wait(events, stages_.has(Stage::ready) ? 0 : static_cast<int>(end - now_));
     for (int i = 0; i < count; ++i) {
-      if (events[i].data.ptr != listener_) handle(events[i]);
+      if (!acceptor_.is_event(events[i])) handle(events[i]);
     }
     serve_ready();
     free_closed();
@@ -108,54 +94,79 @@ void IpcWorker::finish() noexcept {
 }
 
 bool IpcWorker::has_calls_under_way() const noexcept {
-  for (const Stage stage : {Stage::fresh, Stage::partial, Stage::ready, Stage::sending}) {
-    if (!list_of(stage).empty()) return true;
-  }
-  return false;
+  return stages_.has(Stage::fresh) || stages_.has(Stage::partial) || stages_.has(Stage::ready) ||
+         stages_.has(Stage::sending);
+}
+
+// Milliseconds until something is due that no event announces, -1 when nothing is.
+int IpcWorker::wait_limit() const noexcept {
+  if (stages_.has(Stage::ready)) return 0;
+  return milliseconds_until(std::min(stages_.due(), acceptor_.due()));
 }
 
 // Waking a thread can take longer than a whole call: a client that calls again and again is awaited for a moment
 // without going to sleep, while everybody else may run.
 int IpcWorker::wait_for_events(std::span<epoll_event> events) noexcept {
-  const auto wait = [&](int milliseconds) {
-    return ::epoll_wait(epoll_.get(), events.data(), static_cast<int>(events.size()), milliseconds);
-  };
   const int limit = wait_limit();
   if (std::exchange(expects_call_, false) && limit != 0) {
     const std::int64_t end = monotonic_microseconds() + kAwakeMicroseconds;
     do {
-      if (const int count = wait(0); count != 0) return count;
+      if (const int count = queue_.wait(events, 0); count != 0) return count;
       ::sched_yield();
     } while (monotonic_microseconds() < end);
   }
-  return wait(limit);
+  return queue_.wait(events, limit);
 }
 
 void IpcWorker::handle(const epoll_event& event) noexcept {
-  if (event.data.ptr == listener_) {
-    accept_some();
-  } else if (event.data.ptr == &wake_) {
-    eventfd_t count;
-    ::eventfd_read(wake_.get(), &count);
+  if (acceptor_.is_event(event)) {
+    acceptor_.accept_some();
+  } else if (queue_.is_bell(event)) {
+    queue_.silence();
     take_in_handed_over();
-    if (must_make_room_.exchange(false)) make_room();
+    if (must_make_room_.exchange(false)) {
+      acceptor_.make_room();
+      bound_held_input();
+    }
   } else {
     serve(*static_cast<IpcConnection*>(event.data.ptr));
   }
 }
 
-// Milliseconds until something is due that no event announces, -1 when nothing is.
-int IpcWorker::wait_limit() const noexcept {
-  if (!list_of(Stage::ready).empty()) return 0;
-  std::int64_t due = INT64_MAX;
-  if (const IpcConnection* first = list_of(Stage::partial).front())
-    due = std::min(due, first->since + kCallMilliseconds);
-  if (const IpcConnection* first = list_of(Stage::sending).front()) {
-    due = std::min(due, first->since + kReplyMilliseconds);
+void IpcWorker::ask_for_room() noexcept {
+  must_make_room_.store(true);
+  queue_.ring();
+}
+
+void IpcWorker::hand_over(IpcConnection& connection) noexcept {
+  count_.fetch_add(1, std::memory_order_relaxed);
+  {
+    const LockHold hold(lock_);
+    handed_over_.push_back(&connection);
   }
-  if (listen_again_ != 0) due = std::min(due, listen_again_);
-  if (due == INT64_MAX) return -1;
-  return static_cast<int>(std::clamp<std::int64_t>(due - monotonic_milliseconds(), 1, kReplyMilliseconds));
+  queue_.ring();
+}
+
+void IpcWorker::take_in_handed_over() noexcept {
+  IntrusiveList<IpcConnection> arrived;
+  {
+    const LockHold hold(lock_);
+    arrived.take_all(handed_over_);
+  }
+  while (IpcConnection* connection = arrived.front()) {
+    stages_.move(*connection, Stage::fresh, now_);
+    set_interest(*connection, EPOLLIN);
+  }
+}
+
+// A client that sends a call and leaves, or sends something that is no call, costs no more than that: the queue never
+// hears of it.
+bool IpcWorker::take_in(IpcConnection& connection) noexcept {
+  count_.fetch_add(1, std::memory_order_relaxed);
+  stages_.move(connection, Stage::fresh, now_);
+  receive(connection);
+  if (connection.interest == 0 && connection.stage != Stage::closed) set_interest(connection, EPOLLIN);
+  return connection.stage == Stage::closed;
 }
 
 void IpcWorker::serve(IpcConnection& connection) noexcept {
@@ -163,11 +174,7 @@ void IpcWorker::serve(IpcConnection& connection) noexcept {
     case Stage::fresh:
     case Stage::idle:
     case Stage::partial: return receive(connection);
-    case Stage::sending:
-      connection.continue_sending();
-      if (connection.is_broken()) return close(connection);
-      if (!connection.has_waiting_reply()) finish_reply(connection);
-      return;
+    case Stage::sending: return go_on_sending(connection);
     case Stage::ready:
     case Stage::closed: return;
   }
@@ -180,143 +187,124 @@ void IpcWorker::receive(IpcConnection& connection) noexcept {
     if (errno != EAGAIN && errno != EINTR) close(connection);
     return;
   }
-  const std::span<const std::byte> received(room_, static_cast<std::size_t>(count));
-  if (received.empty()) {
-    connection.input_ended = true;
-  } else if (connection.input.empty()) {
-    return take_turn(connection, received);
-  } else if (!connection.input.append(received.data(), received.size())) {
-    return close(connection);
+  connection.input_ended = count == 0;
+  if (!connection.input.borrow({room_, static_cast<std::size_t>(count)})) return close(connection);
+  switch (find_call(connection)) {
+    case wire::FrameResult::complete: return run_call(connection);
+    case wire::FrameResult::incomplete: return settle(connection);
+    case wire::FrameResult::refused: return close(connection);
   }
-  take_turn(connection, connection.input.bytes());
 }
 
-// Runs the first call in `bytes`, if it is whole, and keeps the others for later turns: a client that sends many calls
-// at once gets no more than one before everybody else has had theirs.
-void IpcWorker::take_turn(IpcConnection& connection, std::span<const std::byte> bytes) noexcept {
-  wire::Frame frame;
-  const wire::FrameResult result = wire::parse_frame(bytes, kMaximumCallBody, frame);
-  if (result == wire::FrameResult::refused) return close(connection);
-  std::size_t used = 0;
-  if (result == wire::FrameResult::complete) {
-    if (frame.head.kind != wire::FrameKind::call) return close(connection);
-    expects_call_ |= std::exchange(connection.has_called, true);
-    connection.run_call(frame, outgoing_);
-    if (connection.is_broken()) return close(connection);
-    used = wire::kFrameHeadSize + frame.head.body_length;
-    // The rest of the input, if any, begins a call of its own, with its own time.
-    move_to(connection, Stage::idle);
+// Takes the next call off the input.
+wire::FrameResult IpcWorker::find_call(IpcConnection& connection) noexcept {
+  const wire::FrameResult result = connection.input.next(kMaximumCallBody, connection.call);
+  if (result != wire::FrameResult::complete) return result;
+  return connection.call.head.kind == wire::FrameKind::call ? result : wire::FrameResult::refused;
+}
+
+// Runs the call that was found. What is left of the input begins a call of its own, with its own time: a client that
+// sends many calls at once gets no more than one before everybody else has had theirs.
+void IpcWorker::run_call(IpcConnection& connection) noexcept {
+  expects_call_ |= std::exchange(connection.has_called, true);
+  connection.run_call(connection.call, outgoing_);
+  if (connection.is_broken()) return close(connection);
+  if (!connection.has_waiting_reply()) {
+    stages_.move(connection, Stage::idle, now_);
+    return settle(connection);
   }
-  if (bytes.data() == connection.input.data()) {
-    connection.input.consume(used);
-    if (connection.input.empty()) connection.input.clear(0);
-  } else if (!connection.input.append(bytes.data() + used, bytes.size() - used)) {
-    return close(connection);
-  }
-  if (connection.has_waiting_reply()) {
-    move_to(connection, Stage::sending);
-    return set_interest(connection, EPOLLOUT);
-  }
-  settle(connection);
+  // The next call is read once the client has taken this reply.
+  if (!connection.input.keep()) return close(connection);
+  note_held_input(connection);
+  stages_.move(connection, Stage::sending, now_);
+  set_interest(connection, EPOLLOUT);
   bound_held_input();
-}
-
-// Many clients that each begin a call would together hold more than the device can spare: beyond the budget, the oldest
-// unfinished calls of the user who holds most connections end, and where this worker has none, its oldest.
-void IpcWorker::bound_held_input() noexcept {
-  while (listener_->held_input() > kHeldInputBudget) {
-    const uid_t heaviest = listener_->shares().heaviest();
-    ConnectionList& partial = list_of(Stage::partial);
-    IpcConnection* oldest = partial.front();
-    while (oldest != nullptr && oldest->peer().user != heaviest) oldest = partial.after(oldest);
-    if (oldest == nullptr) oldest = partial.front();
-    if (oldest == nullptr) return;
-    close(*oldest);
-  }
 }
 
 // Finds out what a connection without a waiting reply waits for next.
 void IpcWorker::settle(IpcConnection& connection) noexcept {
-  listener_->count_input(connection);
-  wire::Frame frame;
+  if (!connection.input.keep()) return close(connection);
+  note_held_input(connection);
   const bool has_input = !connection.input.empty();
-  if (has_input &&
-      wire::parse_frame(connection.input.bytes(), kMaximumCallBody, frame) != wire::FrameResult::incomplete) {
-    return move_to(connection, Stage::ready);
-  }
-  if (connection.input_ended) return close(connection);
-  if (!has_input) {
-    if (connection.stage > Stage::idle) move_to(connection, Stage::idle);
+  const wire::FrameResult next = has_input ? find_call(connection) : wire::FrameResult::incomplete;
+  if (next == wire::FrameResult::refused) return close(connection);
+  if (next == wire::FrameResult::complete) {
+    stages_.move(connection, Stage::ready, now_);
+  } else if (connection.input_ended) {
+    return close(connection);
+  } else if (!has_input) {
+    if (connection.stage > Stage::idle) stages_.move(connection, Stage::idle, now_);
   } else if (connection.stage != Stage::partial) {
-    move_to(connection, Stage::partial);
+    stages_.move(connection, Stage::partial, now_);
   }
+  bound_held_input();
 }
 
-void IpcWorker::finish_reply(IpcConnection& connection) noexcept {
+void IpcWorker::go_on_sending(IpcConnection& connection) noexcept {
+  connection.continue_sending();
+  if (connection.is_broken()) return close(connection);
+  if (connection.has_waiting_reply()) return;
   listener_->waiting_replies().forget_unused();
-  move_to(connection, Stage::idle);
+  stages_.move(connection, Stage::idle, now_);
   set_interest(connection, EPOLLIN);
   if (connection.stage != Stage::closed) settle(connection);
 }
 
+void IpcWorker::set_interest(IpcConnection& connection, std::uint32_t events) noexcept {
+  if (connection.interest == events) return;
+  const bool done = connection.interest == 0 ? queue_.add(connection.descriptor(), events, &connection)
+                                             : queue_.change(connection.descriptor(), events, &connection);
+  if (!done) return close(connection);
+  connection.interest = events;
+}
+
+void IpcWorker::note_held_input(IpcConnection& connection) noexcept {
+  const std::size_t held = connection.input.held();
+  listener_->places().hold(connection.peer().user, std::exchange(connection.noted_input, held), held);
+}
+
 // One turn for each connection that was ready before the round.
 void IpcWorker::serve_ready() noexcept {
-  ConnectionList round;
-  round.take_all(list_of(Stage::ready));
+  IntrusiveList<IpcConnection> round;
+  stages_.take_all(Stage::ready, round);
   while (IpcConnection* connection = round.front()) {
     connection->unlink();
-    take_turn(*connection, connection->input.bytes());
+    run_call(*connection);
   }
 }
 
-void IpcWorker::move_to(IpcConnection& connection, Stage stage) noexcept {
-  connection.stage = stage;
-  connection.since = now_;
-  list_of(stage).push_back(&connection);
-}
-
-void IpcWorker::set_interest(IpcConnection& connection, std::uint32_t events) noexcept {
-  if (connection.interest == events) return;
-  epoll_event event = {};
-  event.events = events;
-  event.data.ptr = &connection;
-  const int operation = connection.interest == 0 ? EPOLL_CTL_ADD : EPOLL_CTL_MOD;
-  if (::epoll_ctl(epoll_.get(), operation, connection.descriptor(), &event) != 0) return close(connection);
-  connection.interest = events;
+// Many clients that each begin a call would together hold more than the device can spare. Beyond the budget, the oldest
+// of the user whose clients hold most end: those in the middle of a call first, then those that keep calls waiting
+// because they do not take a reply.
+void IpcWorker::bound_held_input() noexcept {
+  while (listener_->places().hold_too_much()) {
+    const uid_t greediest = listener_->places().greediest();
+    IpcConnection* oldest = stages_.oldest(Stage::partial, greediest);
+    if (oldest == nullptr) oldest = stages_.oldest(Stage::sending, greediest);
+    if (oldest == nullptr) return listener_->ask_others_for_room(*this);
+    close(*oldest);
+  }
 }
 
 void IpcWorker::close(IpcConnection& connection) noexcept {
   if (connection.stage == Stage::closed) return;
   connection.close();
-  connection.input.clear(0);
-  listener_->count_input(connection);
-  listener_->shares().remove(connection.peer().user);
-  move_to(connection, Stage::closed);
+  connection.input.clear();
+  note_held_input(connection);
+  listener_->places().give_back(connection.peer().user);
+  stages_.move(connection, Stage::closed, now_);
   count_.fetch_sub(1, std::memory_order_relaxed);
-  // A descriptor is free again.
-  if (listen_again_ != 0) listen_again_ = now_;
+  acceptor_.end_rest();
 }
 
 void IpcWorker::close_overdue() noexcept {
-  for (const auto& [stage, limit] :
-       {std::pair(Stage::partial, kCallMilliseconds), std::pair(Stage::sending, kReplyMilliseconds)}) {
-    IpcConnection* first = nullptr;
-    while ((first = list_of(stage).front()) != nullptr && first->since + limit <= now_) close(*first);
-  }
-}
-
-void IpcWorker::close_all() noexcept {
-  for (ConnectionList& list : lists_) {
-    if (&list == &list_of(Stage::closed)) break;
-    while (IpcConnection* connection = list.front()) close(*connection);
-  }
-  free_closed();
+  while (IpcConnection* connection = stages_.overdue(now_)) close(*connection);
 }
 
 // A connection is freed only after the batch of events that it was closed in, which may still name it.
 void IpcWorker::free_closed() noexcept {
   bool waited = false;
-  while (IpcConnection* connection = list_of(Stage::closed).front()) {
+  while (IpcConnection* connection = stages_.oldest(Stage::closed)) {
     waited |= connection->has_waiting_reply();
     delete connection;
   }

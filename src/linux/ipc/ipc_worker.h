@@ -1,18 +1,19 @@
-// One thread of the IPC service: an event queue, the connections that belong to it, and their deadlines. Every worker
-// accepts; a new connection goes to the worker with the fewest.
+// One thread of the IPC service: an event queue, the connections that belong to it, and the calls on them. Every worker
+// accepts (ipc_acceptor.h); what its connections wait for, and for how long, is written down in ipc_stages.h.
 #pragma once
 
 #include <pthread.h>
-#include <sys/epoll.h>
 
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <span>
 
+#include "linux/base/event_queue.h"
 #include "linux/base/intrusive_list.h"
+#include "linux/ipc/ipc_acceptor.h"
 #include "linux/ipc/ipc_connection.h"
-#include "platform/descriptor.h"
+#include "linux/ipc/ipc_stages.h"
 #include "platform/lock.h"
 
 namespace quorvel::platform {
@@ -23,7 +24,7 @@ namespace quorvel::platform::host {
 
 class IpcWorker {
  public:
-  IpcWorker() noexcept = default;
+  IpcWorker() noexcept : acceptor_(*this) {}
   IpcWorker(const IpcWorker&) = delete;
   IpcWorker& operator=(const IpcWorker&) = delete;
   /// All connections are closed; the thread must have been stopped.
@@ -40,61 +41,55 @@ class IpcWorker {
   /// its listener must then be left to it.
   [[nodiscard]] bool wait_for_end(std::int64_t deadline) noexcept;
 
-  /// Has the worker close a connection of the user who holds most, if there are still too many. Any thread.
+  /// Has the worker close connections of the user who holds most, if there is still too much. Any thread.
   void ask_for_room() noexcept;
-
+  /// Gives a new connection to this worker. Any thread.
+  void hand_over(IpcConnection& connection) noexcept;
   /// How many connections belong to this worker. Any thread.
   [[nodiscard]] std::size_t connection_count() const noexcept { return count_.load(std::memory_order_relaxed); }
 
+  // For the acceptor, on the worker's thread.
+
+  /// Keeps a new connection and reads from it at once. Returns whether its client is gone already.
+  [[nodiscard]] bool take_in(IpcConnection& connection) noexcept;
+  void close(IpcConnection& connection) noexcept;
+  [[nodiscard]] const IpcStages& stages() const noexcept { return stages_; }
+  /// When this batch of events began, in milliseconds of the monotonic clock.
+  [[nodiscard]] std::int64_t now() const noexcept { return now_; }
+
  private:
   using Stage = IpcConnection::Stage;
-  using ConnectionList = IntrusiveList<IpcConnection>;
 
+  // The loop.
   static void* run_thread(void* worker) noexcept;
   void run() noexcept;
   void finish() noexcept;
   [[nodiscard]] bool has_calls_under_way() const noexcept;
+  [[nodiscard]] int wait_limit() const noexcept;
   [[nodiscard]] int wait_for_events(std::span<epoll_event> events) noexcept;
   void handle(const epoll_event& event) noexcept;
-  [[nodiscard]] int wait_limit() const noexcept;
+  void take_in_handed_over() noexcept;
 
-  // Serving: ipc_worker.cpp.
+  // One connection.
   void serve(IpcConnection& connection) noexcept;
   void receive(IpcConnection& connection) noexcept;
-  void take_turn(IpcConnection& connection, std::span<const std::byte> bytes) noexcept;
+  [[nodiscard]] wire::FrameResult find_call(IpcConnection& connection) noexcept;
+  void run_call(IpcConnection& connection) noexcept;
   void settle(IpcConnection& connection) noexcept;
-  void bound_held_input() noexcept;
-  void finish_reply(IpcConnection& connection) noexcept;
-  void serve_ready() noexcept;
-  void move_to(IpcConnection& connection, Stage stage) noexcept;
+  void go_on_sending(IpcConnection& connection) noexcept;
   void set_interest(IpcConnection& connection, std::uint32_t events) noexcept;
-  void close(IpcConnection& connection) noexcept;
-  void close_overdue() noexcept;
-  void close_all() noexcept;
-  void free_closed() noexcept;
-  [[nodiscard]] ConnectionList& list_of(Stage stage) noexcept { return lists_[static_cast<std::size_t>(stage)]; }
-  [[nodiscard]] const ConnectionList& list_of(Stage stage) const noexcept {
-    return lists_[static_cast<std::size_t>(stage)];
-  }
+  void note_held_input(IpcConnection& connection) noexcept;
 
-  // Accepting: ipc_worker_accept.cpp.
-  void listen() noexcept;
-  void rest() noexcept;
-  void accept_some() noexcept;
-  [[nodiscard]] bool accept_one() noexcept;
-  [[nodiscard]] bool introduce(Descriptor socket) noexcept;
-  [[nodiscard]] bool has_place_for_one_more() noexcept;
-  void make_room() noexcept;
-  [[nodiscard]] IpcConnection* first_to_give_way() noexcept;
-  void hand_over(IpcConnection& connection) noexcept;
-  void take_in(IpcConnection& connection) noexcept;
-  void take_in_handed_over() noexcept;
+  // All of them.
+  void serve_ready() noexcept;
+  void bound_held_input() noexcept;
+  void close_overdue() noexcept;
+  void free_closed() noexcept;
 
   static constexpr std::size_t kReceiveRoom = 16u << 10;
 
   IpcListener* listener_ = nullptr;
-  Descriptor epoll_;
-  Descriptor wake_;
+  EventQueue queue_;
   pthread_t thread_ = {};
   bool started_ = false;
   std::atomic<bool> stopping_ = false;
@@ -104,13 +99,13 @@ class IpcWorker {
   // The thread's own.
   bool expects_call_ = false;  // soon, from a client that called more than once
   std::int64_t now_ = 0;
-  std::int64_t listen_again_ = 0;  // when a resting listener is listened to again; 0 while it is listened to
-  ConnectionList lists_[static_cast<std::size_t>(Stage::closed) + 1];
+  IpcStages stages_;
+  IpcAcceptor acceptor_;
   IpcOutgoing outgoing_;
   std::byte room_[kReceiveRoom];
 
   Lock lock_;
-  ConnectionList handed_over_ QUORVEL_GUARDED_BY(lock_);
+  IntrusiveList<IpcConnection> handed_over_ QUORVEL_GUARDED_BY(lock_);
 };
 
 }  // namespace quorvel::platform::host

@@ -5,7 +5,7 @@
 #include <cstdint>
 
 #include "linux/base/intrusive_list.h"
-#include "linux/base/user_shares.h"
+#include "linux/base/places.h"
 #include "platform/descriptor.h"
 #include "wire/frame.h"
 #include "wire/notification_ring.h"

@@ -1,13 +1,9 @@
 #include "linux/notifications/notification_server.h"
 
-#include <sys/eventfd.h>
-#include <sys/socket.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <new>
 
-#include "linux/base/connection_limit.h"
 #include "linux/base/error_line.h"
 #include "linux/base/monotonic_clock.h"
 #include "linux/base/thread.h"
@@ -15,29 +11,20 @@
 
 namespace quorvel::platform::host {
 
-bool NotificationServer::watch(int descriptor, std::uint32_t events, void* who, int operation) noexcept {
-  epoll_event event = {};
-  event.events = events;
-  event.data.ptr = who;
-  return ::epoll_ctl(epoll_.get(), operation, descriptor, &event) == 0;
-}
-
 bool NotificationServer::start() noexcept {
   socket_ = ListeningSocket::open(wire::kNotificationSocket);
   if (!socket_) return false;
-  epoll_ = Descriptor(::epoll_create1(EPOLL_CLOEXEC));
-  wake_ = Descriptor(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
-  if (epoll_ && wake_ && watch(wake_.get(), EPOLLIN, &wake_, EPOLL_CTL_ADD) &&
-      watch(socket_.get(), EPOLLIN, &socket_, EPOLL_CTL_ADD)) {
+  if (queue_.open_with_bell()) {
     errno = start_thread(thread_, run_thread, this);
     if (errno == 0) {
       running_.store(true, std::memory_order_release);
       return true;
     }
   }
+  const int error = errno;
   socket_ = ListeningSocket();
-  wake_ = Descriptor();
-  epoll_ = Descriptor();
+  queue_ = EventQueue();
+  errno = error;
   return false;
 }
 
@@ -45,13 +32,13 @@ void NotificationServer::stop() noexcept {
   if (!running_.exchange(false)) return;
   socket_.remove_file();
   stopping_.store(true, std::memory_order_release);
-  ::eventfd_write(wake_.get(), 1);
+  queue_.ring();
   if (!join_thread(thread_, end_of_patience())) print_error_line("the thread of the notification center does not end");
 }
 
 void NotificationServer::post(ByteBuffer frame) noexcept {
   ring_.append(std::move(frame));
-  if (!woken_.exchange(true)) ::eventfd_write(wake_.get(), 1);
+  if (!woken_.exchange(true)) queue_.ring();
 }
 
 void* NotificationServer::run_thread(void* server) noexcept {
@@ -61,19 +48,20 @@ void* NotificationServer::run_thread(void* server) noexcept {
 }
 
 void NotificationServer::run() noexcept {
+  listener_.open(queue_, socket_.get(), EPOLLIN);
   while (!stopping_.load(std::memory_order_acquire)) {
     // One event at a time: an observer may end while it is served, and no event of it may be met after that.
     epoll_event event;
-    const int count = ::epoll_wait(epoll_.get(), &event, 1, listen_again_ != 0 ? kAcceptRestMilliseconds : -1);
+    const int count = queue_.wait({&event, 1}, milliseconds_until(listener_.due()));
     if (count > 0) handle(event);
-    if (listen_again_ != 0 && monotonic_milliseconds() >= listen_again_) listen();
+    listener_.wake_when_due(monotonic_milliseconds());
   }
   serve_news();
   while (NotificationObserver* observer = observers_.front()) remove(*observer);
 }
 
 void NotificationServer::handle(const epoll_event& event) noexcept {
-  if (event.data.ptr == &wake_ || event.data.ptr == &socket_) return serve_news();
+  if (queue_.is_bell(event) || listener_.is_event(event)) return serve_news();
   auto& observer = *static_cast<NotificationObserver*>(event.data.ptr);
   if ((event.events & (EPOLLHUP | EPOLLERR)) != 0) {
     remove(observer);
@@ -87,11 +75,10 @@ void NotificationServer::handle(const epoll_event& event) noexcept {
 // who was connected before one of the numbers up to it is then accepted here or was accepted before, and starts from
 // the number of the round before.
 void NotificationServer::serve_news() noexcept {
-  eventfd_t count;
-  ::eventfd_read(wake_.get(), &count);
+  queue_.silence();
   woken_.store(false);
   const std::uint64_t newest = ring_.newest();
-  if (listen_again_ == 0) accept_all();
+  if (!listener_.is_resting()) accept_all();
   served_ = newest;
   NotificationObserver* next = nullptr;
   for (NotificationObserver* observer = observers_.front(); observer != nullptr; observer = next) {
@@ -106,16 +93,14 @@ void NotificationServer::serve(NotificationObserver& observer) noexcept {
   if (progress == Progress::gone) return remove(observer);
   const bool must_wait = progress == Progress::blocked;
   if (must_wait == observer.is_waiting) return;
-  if (!watch(observer.descriptor(), must_wait ? EPOLLOUT : 0u, &observer, EPOLL_CTL_MOD)) return remove(observer);
+  if (!queue_.change(observer.descriptor(), must_wait ? EPOLLOUT : 0u, &observer)) return remove(observer);
   observer.is_waiting = must_wait;
 }
 
 void NotificationServer::remove(NotificationObserver& observer) noexcept {
-  shares_.remove(observer.user());
+  places_.give_back(observer.user());
   delete &observer;
-  --observer_count_;
-  // A descriptor is free again.
-  if (listen_again_ != 0) listen_again_ = monotonic_milliseconds();
+  listener_.end_rest();
 }
 
 // Lets go of what every observer has been given. Those to come start from what was served last.
@@ -129,18 +114,15 @@ void NotificationServer::forget_served() noexcept {
 }
 
 void NotificationServer::accept_all() noexcept {
-  for (;;) {
-    Descriptor socket(::accept4(socket_.get(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
-    if (!socket && (errno == EINTR || errno == ECONNABORTED)) continue;
-    if (!socket && errno == EAGAIN) return;
-    if (!socket || !take_in(std::move(socket))) return rest();
-    if (observer_count_ > observer_connection_limit()) make_room();
+  while (Descriptor socket = listener_.accept()) {
+    if (!take_in(std::move(socket))) return listener_.rest();
+    if (places_.are_overfull()) make_room();
   }
 }
 
 // Of the user who has most observers, the newest gives way: those that have listened for long miss nothing.
 void NotificationServer::make_room() noexcept {
-  const uid_t heaviest = shares_.heaviest();
+  const uid_t heaviest = places_.heaviest();
   NotificationObserver* newest = nullptr;
   for (NotificationObserver* observer = observers_.front(); observer != nullptr;
        observer = observers_.after(observer)) {
@@ -152,32 +134,17 @@ void NotificationServer::make_room() noexcept {
 bool NotificationServer::take_in(Descriptor socket) noexcept {
   auto* observer = new (std::nothrow) NotificationObserver(std::move(socket), served_);
   if (observer == nullptr) return false;
-  if (shares_.add(observer->user()) == 0) {
+  if (places_.take(observer->user()) == 0) {
     delete observer;
     return false;
   }
-  if (!watch(observer->descriptor(), 0, observer, EPOLL_CTL_ADD)) {
-    shares_.remove(observer->user());
+  if (!queue_.add(observer->descriptor(), 0, observer)) {
+    places_.give_back(observer->user());
     delete observer;
     return false;
   }
   observers_.push_back(observer);
-  ++observer_count_;
   return true;
-}
-
-void NotificationServer::listen() noexcept {
-  listen_again_ = 0;
-  if (!watch(socket_.get(), EPOLLIN, &socket_, EPOLL_CTL_ADD)) {
-    listen_again_ = monotonic_milliseconds() + kAcceptRestMilliseconds;
-  }
-}
-
-// A listener that cannot be accepted from stays readable and would keep the thread awake.
-void NotificationServer::rest() noexcept {
-  if (listen_again_ != 0) return;
-  ::epoll_ctl(epoll_.get(), EPOLL_CTL_DEL, socket_.get(), nullptr);
-  listen_again_ = monotonic_milliseconds() + kAcceptRestMilliseconds;
 }
 
 }  // namespace quorvel::platform::host

@@ -2,15 +2,16 @@
 #pragma once
 
 #include <pthread.h>
-#include <sys/epoll.h>
 
 #include <atomic>
-#include <cstddef>
 #include <cstdint>
 
+#include "linux/base/connection_limit.h"
+#include "linux/base/event_queue.h"
 #include "linux/base/local_socket.h"
+#include "linux/base/places.h"
+#include "linux/base/resting_listener.h"
 #include "linux/notifications/notification_observer.h"
-#include "platform/descriptor.h"
 #include "wire/notification_ring.h"
 
 namespace quorvel::platform::host {
@@ -36,7 +37,6 @@ class NotificationServer {
   using Progress = NotificationObserver::Progress;
 
   static void* run_thread(void* server) noexcept;
-  [[nodiscard]] bool watch(int descriptor, std::uint32_t events, void* who, int operation) noexcept;
   void run() noexcept;
   void handle(const epoll_event& event) noexcept;
   void serve_news() noexcept;
@@ -46,12 +46,9 @@ class NotificationServer {
   void accept_all() noexcept;
   [[nodiscard]] bool take_in(Descriptor socket) noexcept;
   void make_room() noexcept;
-  void listen() noexcept;
-  void rest() noexcept;
 
   ListeningSocket socket_;
-  Descriptor epoll_;
-  Descriptor wake_;
+  EventQueue queue_;
   pthread_t thread_ = {};
   std::atomic<bool> running_ = false;
   std::atomic<bool> stopping_ = false;
@@ -60,10 +57,9 @@ class NotificationServer {
 
   // The thread's own.
   IntrusiveList<NotificationObserver> observers_;
-  std::size_t observer_count_ = 0;
-  UserShares shares_;
-  std::uint64_t served_ = 0;       // what was newest when observers were last accepted
-  std::int64_t listen_again_ = 0;  // when a resting listener is listened to again; 0 while it is listened to
+  Places places_{observer_connection_limit};
+  std::uint64_t served_ = 0;  // what was newest when observers were last accepted
+  RestingListener listener_;
 };
 
 /// The process's one server. Lives until the process ends.

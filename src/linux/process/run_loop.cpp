@@ -12,13 +12,6 @@
 
 namespace quorvel::platform {
 
-bool RunLoop::watch(int descriptor, std::uint32_t events, RunLoopSource* source) const noexcept {
-  epoll_event event = {};
-  event.events = events;
-  event.data.ptr = source;
-  return ::epoll_ctl(epoll_.get(), EPOLL_CTL_ADD, descriptor, &event) == 0;
-}
-
 bool RunLoop::open() noexcept {
   if (signals_) return true;
   sigset_t ending;
@@ -30,15 +23,14 @@ bool RunLoop::open() noexcept {
     errno = error;
     return false;
   }
-  epoll_ = Descriptor(::epoll_create1(EPOLL_CLOEXEC));
   Descriptor signals(::signalfd(-1, &ending, SFD_CLOEXEC | SFD_NONBLOCK));
-  if (!epoll_ || !signals || !watch(signals.get(), EPOLLIN, nullptr)) return false;
+  if (!signals || !queue_.open() || !queue_.add(signals.get(), EPOLLIN, nullptr)) return false;
   signals_ = std::move(signals);
   return true;
 }
 
 bool RunLoop::add(RunLoopSource& source, std::uint32_t events) noexcept {
-  if (!open() || !watch(source.descriptor, events, &source)) return false;
+  if (!open() || !queue_.add(source.descriptor, events, &source)) return false;
   source.next = sources_;
   source.has_more = false;
   sources_ = &source;
@@ -46,7 +38,7 @@ bool RunLoop::add(RunLoopSource& source, std::uint32_t events) noexcept {
 }
 
 void RunLoop::remove(RunLoopSource& source) noexcept {
-  ::epoll_ctl(epoll_.get(), EPOLL_CTL_DEL, source.descriptor, nullptr);
+  queue_.remove(source.descriptor);
   for (RunLoopSource** link = &sources_; *link != nullptr; link = &(*link)->next) {
     if (*link != &source) continue;
     *link = source.next;
@@ -60,7 +52,7 @@ bool RunLoop::serve_one_event() noexcept {
   bool unfinished = false;
   for (const RunLoopSource* source = sources_; source != nullptr; source = source->next) unfinished |= source->has_more;
   epoll_event event;
-  const int count = ::epoll_wait(epoll_.get(), &event, 1, unfinished ? 0 : -1);
+  const int count = queue_.wait({&event, 1}, unfinished ? 0 : -1);
   if (count < 0) return errno == EINTR;
   if (count == 0) return true;
   auto* source = static_cast<RunLoopSource*>(event.data.ptr);

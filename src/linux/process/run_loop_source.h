@@ -1,10 +1,9 @@
 // What the run loop serves: descriptors that somebody wants to hear of. Main thread only.
 #pragma once
 
-#include <sys/epoll.h>
-
 #include <cstdint>
 
+#include "linux/base/event_queue.h"
 #include "platform/descriptor.h"
 #include "platform/run_loop.h"
 
@@ -32,11 +31,10 @@ class RunLoop {
   void run() noexcept;
 
  private:
-  [[nodiscard]] bool watch(int descriptor, std::uint32_t events, RunLoopSource* source) const noexcept;
   [[nodiscard]] bool serve_one_event() noexcept;
   void serve_unfinished() noexcept;
 
-  Descriptor epoll_;
+  host::EventQueue queue_;
   Descriptor signals_;
   RunLoopSource* sources_ = nullptr;
 };
