@@ -252,13 +252,45 @@ TEST_F(Quorvelctl, TellsHowTheDaemonIs) {
   Program daemon(daemon_program());
   ASSERT_TRUE(daemon.wait_until_ready());
   EXPECT_TRUE(eventually([] { return run_to_end(control_program(), {"status"}).status == 0; }));
-  expect_status(0, "telephony  followed, served by process " + std::to_string(simulator.pid()));
-  expect_status(0, "daemon     running, process " + std::to_string(daemon.pid()));
+  expect_status(0, "telephony  followed\n           served by telvane-sim, process " + std::to_string(simulator.pid()));
+  expect_status(0, "daemon     running, quorveld, process " + std::to_string(daemon.pid()));
   simulator.stop();
   EXPECT_TRUE(eventually([] { return run_to_end(control_program(), {"status"}).status == 1; }));
   expect_status(1, "telephony  not followed: nothing is at /run/quorvel/telvane.sock");
   root.write_file(kDataFile, "garbage");
   expect_status(1, "does not hold a binary property list");
+}
+
+TEST_F(Quorvelctl, TellsTheFactsWithTheirOrigins) {
+  const std::string battery = "/sys/class/power_supply/BAT0/";
+  root.write_file(battery + "type", "Battery");
+  root.write_file(battery + "capacity", "57");
+  root.make_directory("/run/quorvel");
+  root.write_plist("/etc/quorvel/device_information.plist",
+                   dictionary({{"WifiAddress", "3c:6a:9d:00:11:22"}, {"ProductVersion", "1\033[2J"}}));
+  expect_calls({
+      {{"facts", "WiFiAddress", "BatteryCurrentCapacity"},
+       0,
+       "Without a domain\n"
+       "  WiFiAddress             3c:6a:9d:00:11:22\n"
+       "                          address, /etc/quorvel/device_information.plist\n\n"
+       "com.Orvane.mobile.battery\n"
+       "  BatteryCurrentCapacity  57 percent\n"
+       "                          integer, /sys/class/power_supply\n"},
+      {{"facts", "--json", "ProductVersion"},
+       0,
+       "[\n  {\n    \"key\": \"ProductVersion\",\n    \"kind\": \"text\",\n"
+       "    \"origin\": \"/etc/quorvel/device_information.plist\",\n    \"value\": \"1\\u001b[2J\"\n  }\n]\n"},
+      {{"facts", "BasebandVersion"}, 1, "Without a domain\n  BasebandVersion  (no answer)\n"},
+      {{"facts", "Colour"}, 2, ""},
+  });
+  Program simulator(simulator_program());
+  ASSERT_TRUE(simulator.wait_for_output("ready"));
+  EXPECT_EQ(run_to_end(control_program(), {"sim", "set", "firmware-version", "\"1.2\""}).status, 0);
+  expect_calls({{{"ark", "get", "BasebandVersion"}, 0, "1.2\n"}});
+  simulator.send_signal(SIGSTOP);
+  expect_calls({{{"ark", "get", "BasebandVersion"}, 1, ""}});
+  simulator.send_signal(SIGCONT);
 }
 
 TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {

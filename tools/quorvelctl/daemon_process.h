@@ -13,8 +13,8 @@ namespace quorvel::tools {
 struct Server {
   enum class State { absent, refused, unreachable, serving };
   State state = State::absent;
-  pid_t process = 0;  // 0 where it is not known
-  uid_t user = 0;
+  pid_t process = 0;   // 0 where it is not known, 1 where a service manager listens and hides who serves
+  uid_t user = 0;      // who listens
   std::string reason;  // why nobody was reached
 };
 
@@ -27,7 +27,10 @@ struct Server {
 /// A user's name, or the number of one without a name.
 [[nodiscard]] std::string user_name(uid_t user);
 
-/// "process 12 of user mobile".
+/// The name of a process's program, empty where /proc does not tell it.
+[[nodiscard]] std::string program_of(pid_t process);
+
+/// "quorveld, process 12 of user mobile", without the name where /proc does not tell it.
 [[nodiscard]] std::string name_of(const Server& server);
 
 /// When a process started, in whole seconds since 1970; nothing where /proc does not tell.

@@ -75,9 +75,7 @@ void print_change_of(const LiveAnswer& fact, bool json) {
   std::string line(colours.quiet);
   line.append(one_line(PropertyValue::date(time))).append(colours.reset).append("  ").append(colours.key);
   line.append(fact.row->key).append(colours.reset).append("  ");
-  line += fact.value ? one_line(fact.value) : "(no answer)";
-  if (!fact.unit.empty() && fact.value) line.append(" ").append(fact.unit);
-  write_output(line + '\n');
+  write_output(line + value_text(fact) + '\n');
 }
 
 // Asks again and again, and prints each answer that is another than before.

@@ -12,14 +12,10 @@ constexpr std::size_t kIndent = 2;
 constexpr std::size_t kGap = 2;
 constexpr std::size_t kLongestBeside = 24;
 
+// A text that has a unit, such as an address, is of that kind to people.
 std::string source_of(const LiveAnswer& fact) {
-  const std::string kind(kind_name(fact.value.kind()));
+  const std::string kind(fact.value.is_string() && !fact.unit.empty() ? fact.unit : kind_name(fact.value.kind()));
   return fact.origin.empty() ? kind : kind + ", " + displayable(fact.origin);
-}
-
-std::string value_of(const LiveAnswer& fact) {
-  if (!fact.value) return "(no answer)";
-  return one_line(fact.value) + (fact.unit.empty() ? "" : " " + std::string(fact.unit));
 }
 
 struct Columns {
@@ -31,7 +27,7 @@ struct Columns {
 Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
   std::size_t key = 0, value = 0, source = 0;
   for (const LiveAnswer& fact : facts) {
-    const std::size_t columns = columns_of(value_of(fact));
+    const std::size_t columns = columns_of(value_text(fact));
     key = std::max(key, fact.row->key.size());
     if (fact.value) source = std::max(source, columns_of(source_of(fact)));
     if (columns <= kLongestBeside) value = std::max(value, columns);
@@ -44,7 +40,7 @@ Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
 void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& text) {
   const Palette& colours = palette();
   const std::string_view key = fact.row->key;
-  const std::string value = value_of(fact);
+  const std::string value = value_text(fact);
   text.append(kIndent, ' ').append(colours.key).append(key).append(colours.reset);
   text.append(columns.value - kIndent - key.size(), ' ');
   text.append(fact.value ? std::string_view() : colours.quiet).append(value);
@@ -77,6 +73,12 @@ std::string_view kind_name(PropertyKind kind) {
     case PropertyKind::dictionary: return "dictionary";
   }
   return "";
+}
+
+std::string value_text(const LiveAnswer& fact) {
+  if (!fact.value) return "(no answer)";
+  const bool measures = !fact.unit.empty() && !fact.value.is_string();
+  return one_line(fact.value) + (measures ? " " + std::string(fact.unit) : "");
 }
 
 std::string facts_text(const std::vector<LiveAnswer>& facts, std::size_t width) {

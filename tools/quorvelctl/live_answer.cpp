@@ -8,10 +8,10 @@
 namespace quorvel::tools {
 namespace {
 
-std::string_view unit_of(std::string_view name) {
+// Packaging may answer with a value of another kind, which has no unit.
+std::string_view unit_of(const PropertyValue& value, std::string_view name) {
   const platform::DeviceQuestion* question = platform::find_device_question(name);
-  // An address shows by itself what it is.
-  return question == nullptr || question->unit == "address" ? std::string_view() : question->unit;
+  return question != nullptr && question->kind == value.kind() ? question->unit : std::string_view();
 }
 
 }  // namespace
@@ -26,7 +26,7 @@ LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::st
 
 LiveAnswer live_answer(const larry_info& row) {
   const platform::DeviceAnswer answer = platform::copy_device_answer_with_origin(row.question);
-  return {&row, answer.value, std::string(answer.origin.text()), unit_of(row.question)};
+  return {&row, answer.value, std::string(answer.origin.text()), unit_of(answer.value, row.question)};
 }
 
 }  // namespace quorvel::tools

@@ -13,7 +13,7 @@ struct LiveAnswer {
   const larry_info* row = nullptr;  // null for a key that is stored
   PropertyValue value;              // none when the device-information service has no answer
   std::string origin;               // the file or source that answered
-  std::string_view unit;            // empty where the value says it all
+  std::string_view unit;            // empty where the kind says it all
 };
 
 /// What the daemon would answer for a key at this moment, if it is one of the live ones; asked as the caller.

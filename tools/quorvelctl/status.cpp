@@ -35,7 +35,9 @@ int print_status(bool json) {
   findings.push_back(check_log());
   bool well = true;
   PropertyValue all = PropertyValue::dictionary();
-  for (const Finding& finding : findings) {
+  for (Finding& finding : findings) {
+    put(finding.facts, "well", PropertyValue::boolean(finding.verdict == Verdict::well));
+    if (!finding.reason.empty()) put(finding.facts, "reason", PropertyValue::string(displayable(finding.reason)));
     well = well && finding.verdict == Verdict::well;
     put(all, finding.name, finding.facts);
   }

@@ -42,6 +42,16 @@ std::string since_text(double date) {
 
 bool exists(const char* path, struct stat* status) { return platform::file_status(path, status) == 0; }
 
+void put_server(PropertyValue& facts, const Server& server) {
+  if (server.process > 0) {
+    put(facts, "process", PropertyValue::integer(server.process));
+    put(facts, "program", PropertyValue::string(displayable(program_of(server.process))));
+  }
+  put(facts, "user", PropertyValue::string(user_name(server.user)));
+}
+
+bool is_foreign(const Server& service) { return service.state == Server::State::serving && !is_believed(service); }
+
 // Why the daemon does not follow the service that is there or should be, as far as one sees from outside.
 std::string why_not_followed(const Server& service, bool marked) {
   if (service.state == Server::State::absent) {
@@ -49,7 +59,7 @@ std::string why_not_followed(const Server& service, bool marked) {
     return exists(kSocket, &socket) ? std::string("nobody serves ") + kSocket + ", which is there"
                                     : std::string("nothing is at ") + kSocket + ": the service does not run";
   }
-  if (service.state == Server::State::serving && !is_believed(service))
+  if (is_foreign(service))
     return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
   if (!marked)
     return std::string("the daemon may have started without it: make ") + paths::kTelephonyMark +
@@ -67,7 +77,7 @@ Finding check_calls() {
   // There is no such operation: that the daemon says so is an answer, and nothing else happens.
   const client::Reply reply = client::Client(options).call("status", {});
   const auto milliseconds = std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start).count();
-  Finding finding{"calls", Verdict::well, {}, PropertyValue::dictionary()};
+  Finding finding{"calls", Verdict::well, {}, {}, PropertyValue::dictionary()};
   const bool answered = reply.error && reply.error->code == client::ErrorCode::service_failure;
   put(finding.facts, "ready", PropertyValue::boolean(answered));
   if (answered) {
@@ -77,24 +87,24 @@ Finding check_calls() {
     put(finding.facts, "milliseconds", PropertyValue::real(milliseconds));
   } else {
     finding.verdict = Verdict::ill;
-    finding.lines.push_back("not answered: " + (reply.error ? reply.error->description : std::string("no reply")));
+    finding.reason = reply.error ? reply.error->description : std::string("no reply");
+    finding.lines.push_back("not answered: " + finding.reason);
   }
   return finding;
 }
 
 Finding check_daemon(const Server& daemon) {
-  Finding finding{"daemon", Verdict::well, {}, PropertyValue::dictionary()};
+  Finding finding{"daemon", Verdict::well, {}, {}, PropertyValue::dictionary()};
   const bool running = daemon.state == Server::State::serving || daemon.state == Server::State::refused;
   put(finding.facts, "running", PropertyValue::boolean(running));
   if (!running) {
     finding.verdict = daemon.state == Server::State::absent ? Verdict::absent : Verdict::ill;
-    finding.lines.push_back(daemon.state == Server::State::absent ? "not running. " + how_to_start("quorveld")
-                                                                  : daemon.reason);
+    finding.reason = daemon.state == Server::State::absent ? "not running. " + how_to_start("quorveld") : daemon.reason;
+    finding.lines.push_back(finding.reason);
     return finding;
   }
   finding.lines.push_back("running, " + name_of(daemon));
-  if (daemon.process > 0) put(finding.facts, "process", PropertyValue::integer(daemon.process));
-  put(finding.facts, "user", PropertyValue::integer(daemon.user));
+  put_server(finding.facts, daemon);
   if (const std::optional<double> start = daemon.process > 0 ? start_of(daemon.process) : std::nullopt) {
     finding.lines.push_back("since " + since_text(*start - kEpoch));
     put(finding.facts, "since", PropertyValue::date(*start - kEpoch));
@@ -103,7 +113,7 @@ Finding check_daemon(const Server& daemon) {
 }
 
 Finding check_telephony(const Server& daemon) {
-  Finding finding{"telephony", Verdict::well, {}, PropertyValue::dictionary()};
+  Finding finding{"telephony", Verdict::well, {}, {}, PropertyValue::dictionary()};
   struct stat status {};
   const bool marked = exists(paths::kTelephonyMark, &status);
   const bool expected = marked || exists(kSocket, &status);
@@ -113,24 +123,29 @@ Finding check_telephony(const Server& daemon) {
     return finding;
   }
   const Server service = server_of("telvane");
-  const std::optional<bool> followed = daemon.process > 0 ? follows_telephony(daemon.process) : std::nullopt;
+  const std::optional<bool> followed = daemon.process > 0 ? follows_telephony(daemon.process) : false;
   if (followed) put(finding.facts, "followed", PropertyValue::boolean(*followed));
   if (followed.value_or(false)) {
-    finding.lines.push_back(service.state == Server::State::serving ? "followed, served by " + name_of(service)
-                                                                    : "followed");
-    return finding;
+    finding.lines.emplace_back("followed");
+  } else if (!followed && service.state != Server::State::absent && !is_foreign(service)) {
+    finding.verdict = Verdict::unknown;
+    finding.reason = "only root and the daemon's user can see whether it is";
+    finding.lines.push_back("followed or not: " + finding.reason);
+  } else {
+    finding.verdict = Verdict::ill;
+    finding.reason = daemon.process > 0 ? why_not_followed(service, marked) : "the daemon does not run";
+    finding.lines.push_back("not followed: " + finding.reason);
   }
-  finding.verdict = followed || service.state == Server::State::absent ? Verdict::ill : Verdict::unknown;
-  const std::string why = finding.verdict == Verdict::unknown && daemon.process > 0
-                              ? "only root and the daemon's user can see whether it is"
-                              : why_not_followed(service, marked);
-  finding.lines.push_back((finding.verdict == Verdict::unknown ? "followed or not: " : "not followed: ") + why);
-  put(finding.facts, "reason", PropertyValue::string(displayable(why)));
+  if (service.state != Server::State::serving) return finding;
+  finding.lines.push_back("served by " + name_of(service));
+  PropertyValue server = PropertyValue::dictionary(3);
+  put_server(server, service);
+  put(finding.facts, "service", server);
   return finding;
 }
 
 Finding check_ark() {
-  Finding finding{"ark", Verdict::well, {}, PropertyValue::dictionary()};
+  Finding finding{"ark", Verdict::well, {}, {}, PropertyValue::dictionary()};
   put(finding.facts, "file", PropertyValue::string(paths::kDataFile));
   try {
     struct stat status {};
@@ -147,13 +162,14 @@ Finding check_ark() {
     put(finding.facts, "saved", PropertyValue::date(saved));
   } catch (const Failure& failure) {
     finding.verdict = Verdict::ill;
+    finding.reason = failure.message;
     finding.lines.push_back(failure.message);
   }
   return finding;
 }
 
 Finding check_log() {
-  Finding finding{"log", Verdict::well, {paths::kLogFile}, PropertyValue::dictionary()};
+  Finding finding{"log", Verdict::well, {paths::kLogFile}, {}, PropertyValue::dictionary()};
   put(finding.facts, "file", PropertyValue::string(paths::kLogFile));
   try {
     LogFiles files;
@@ -168,13 +184,15 @@ Finding check_log() {
     const std::string last = displayable(tail.substr(tail.rfind('\n') + 1));
     if (last.empty()) {
       finding.verdict = Verdict::ill;
-      finding.lines.emplace_back("is missing or empty");
+      finding.reason = "is missing or empty";
+      finding.lines.push_back(finding.reason);
     } else {
       finding.lines.push_back(last);
       put(finding.facts, "last", PropertyValue::string(last));
     }
   } catch (const Failure& failure) {
     finding.verdict = Verdict::ill;
+    finding.reason = failure.message;
     finding.lines.push_back(failure.message);
   }
   return finding;

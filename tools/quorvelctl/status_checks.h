@@ -16,6 +16,7 @@ struct Finding {
   std::string name;
   Verdict verdict = Verdict::well;
   std::vector<std::string> lines;  // for people, the first one says how it is
+  std::string reason;              // why it is not well
   PropertyValue facts;             // for programs, a dictionary
 };
 

@@ -34,14 +34,14 @@ class Interface {
   }
   [[nodiscard]] bool is_on_usb() const noexcept {
     char buffer[1024];
-    return resolved_path(path("device/subsystem"), buffer).ends_with("/usb");
+    return target_path(path("device/subsystem"), buffer).ends_with("/usb");
   }
 
  private:
   // The device's own function on a USB port that it serves.
   [[nodiscard]] bool is_gadget() const noexcept {
     char buffer[1024];
-    return resolved_path(path("device"), buffer).find("/gadget") != std::string_view::npos;
+    return target_path(path("device"), buffer).find("/gadget") != std::string_view::npos;
   }
 
   std::string_view name_;

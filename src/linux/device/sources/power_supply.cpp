@@ -71,7 +71,7 @@ struct Power {
   battery.electricity = level(charge_now, charge_full);
   battery.counts_now = energy_now || charge_now;
   battery.has_gauge = battery.counts_now || number(name, "charge_counter");
-  static_cast<void>(resolved_path(SourcePath(paths::kPowerSupplies, name, "device"), battery.device));
+  static_cast<void>(target_path(SourcePath(paths::kPowerSupplies, name, "device"), battery.device));
   return battery.capacity || battery.has_gauge || energy_full || charge_full;
 }
 

@@ -1,5 +1,8 @@
 #include "linux/device/sources/reading.h"
 
+#include <unistd.h>
+
+#include <algorithm>
 #include <cstring>
 #include <utility>
 
@@ -34,9 +37,12 @@ bool something_stands_at(const SourcePath& path) noexcept {
   return static_cast<bool>(Descriptor(open_file(path.text(), O_PATH | O_NOFOLLOW, 0)));
 }
 
-std::string_view resolved_path(const SourcePath& path, char (&buffer)[1024]) noexcept {
+std::string_view target_path(const SourcePath& path, char (&buffer)[1024]) noexcept {
   const Descriptor object(open_file(path.text(), O_PATH, 0));
-  if (!object || descriptor_path(object.get(), buffer, sizeof buffer) != 0) return {};
+  if (object) return descriptor_path(object.get(), buffer, sizeof buffer) == 0 ? buffer : std::string_view{};
+  const Descriptor link(open_file(path.text(), O_PATH | O_NOFOLLOW, 0));
+  const ssize_t length = link ? ::readlinkat(link.get(), "", buffer, sizeof buffer - 1) : -1;
+  buffer[std::max<ssize_t>(length, 0)] = '\0';
   return buffer;
 }
 

@@ -53,8 +53,9 @@ class SourceFile {
 /// True when anything stands at the path, a link that leads nowhere included.
 [[nodiscard]] bool something_stands_at(const SourcePath& path) noexcept;
 
-/// The path of an object with every link resolved, empty when it has none. A view into `buffer`.
-[[nodiscard]] std::string_view resolved_path(const SourcePath& path, char (&buffer)[1024]) noexcept;
+/// The path of an object with every link resolved, or of a link that leads nowhere what it says; empty when there is
+/// neither. A view into `buffer`.
+[[nodiscard]] std::string_view target_path(const SourcePath& path, char (&buffer)[1024]) noexcept;
 
 /// An answer of a text that came from a file, or none when the text is empty.
 [[nodiscard]] DeviceAnswer text_answer(std::string_view text, const char* origin) noexcept;
