@@ -1,6 +1,7 @@
 #include "bridge/facts.h"
 
 #include <algorithm>
+#include <cstring>
 #include <tuple>
 
 #include "bridge/state.h"
@@ -25,8 +26,29 @@ std::string shown(const std::string& identity, bool in_full) {
   return in_full || identity.size() <= 4 ? identity : "..." + identity.substr(identity.size() - 4);
 }
 
-const char* text_of(Reach reach) {
-  return reach == Reach::bus_lost ? "the bus is lost" : "the modem service does not run";
+std::string text_of(const Reading& reading) {
+  if (reading.reach == Reach::bus_lost) return "the bus is lost";
+  if (reading.reach == Reach::not_running) return "the modem service does not run";
+  return std::string("the modem service does not answer: ") + std::strerror(reading.error);
+}
+
+std::string text_of(const Modem& modem) {
+  const std::string status = sim_status(modem);
+  if (modem.state == ModemState::starting) return "the modem is starting";
+  if (modem.state == ModemState::failed) return "the modem failed, reason " + std::to_string(modem.failure);
+  return "SIM status " + (status.empty() ? "none" : status);
+}
+
+std::string list_of(const std::vector<std::string>& words) {
+  std::string list;
+  for (const std::string& word : words) list += (list.empty() ? "" : ", ") + word;
+  return list;
+}
+
+std::string devices_of(const Reading& reading) {
+  std::vector<std::string> devices;
+  for (const Modem& modem : reading.modems) devices.push_back(modem.device);
+  return list_of(devices);
 }
 
 }  // namespace
@@ -43,6 +65,7 @@ const Modem* Facts::find_best() const {
     return std::tuple(rank(modem), modem.device != chosen_, std::string_view(modem.device));
   };
   for (const Modem& modem : reading_.modems) {
+    if (!pinned_.empty() && modem.device != pinned_) continue;
     if (best == nullptr || key(modem) < key(*best)) best = &modem;
   }
   return best;
@@ -55,7 +78,6 @@ bool Facts::keeps_imsi(const Modem* modem) const {
 
 Telling Facts::take(Reading reading, Clock::time_point now) {
   reading_ = std::move(reading);
-  if (!pinned_.empty()) std::erase_if(reading_.modems, [this](const Modem& modem) { return modem.device != pinned_; });
   const Modem* chosen = find_chosen();
   // While the chosen modem is away, or comes back, no other takes its place.
   const bool waits = !chosen_.empty() && (chosen == nullptr || chosen->state == ModemState::starting);
@@ -63,23 +85,40 @@ Telling Facts::take(Reading reading, Clock::time_point now) {
   const bool is_settled = reading_.reach != Reach::running ? static_cast<bool>(told_)
                                                            : modem != nullptr && modem->state != ModemState::starting;
   if (!is_settled) {
-    if (!deadline_) deadline_ = now + (told_ ? kSwapPatience : kStartPatience);
-    if (now < *deadline_) return {told_ ? PropertyValue() : state_of(reading_.reach, modem, false), {}, {}};
+    if (!deadline_ || now < *deadline_) return wait(chosen, now);
     modem = reading_.reach == Reach::running ? find_best() : nullptr;
   }
-  deadline_.reset();
-  if (reading_.reach == Reach::running) chosen_ = modem != nullptr ? modem->device : "";
   return tell(modem);
 }
 
+// Before the first telling the state goes along with each reading, so that whoever asks sees why there is nothing.
+Telling Facts::wait(const Modem* modem, Clock::time_point now) {
+  Telling telling{told_ ? PropertyValue() : state_of(reading_, find_best(), false), {}, {}};
+  if (deadline_) return telling;
+  const std::chrono::seconds patience = told_ ? kSwapPatience : kStartPatience;
+  deadline_ = now + patience;
+  const std::string who = chosen_.empty() ? "a modem" : "the modem " + chosen_;
+  const std::string why = modem != nullptr ? ", which is starting" : chosen_.empty() ? "" : ", which went away";
+  telling.lines = {"waiting up to " + std::to_string(patience.count()) + " s for " + who + why};
+  return telling;
+}
+
 Telling Facts::tell(const Modem* modem) {
-  PropertyValue state = state_of(reading_.reach, modem, keeps_imsi(modem));
-  if (!state) return {{}, {}, "memory does not suffice for the state"};
+  const bool waited = deadline_.has_value();
+  deadline_.reset();
   const std::string status = modem != nullptr ? sim_status(*modem) : "";
-  std::vector<std::string> list = events(state, modem, status);
-  std::string text = list.empty() ? "" : line(list, modem, status);
-  remember(state, modem, status);
-  return {std::move(state), std::move(list), std::move(text)};
+  Telling telling{state_of(reading_, modem, keeps_imsi(modem)), {}, {}};
+  if (!telling.state) return {{}, {}, {"memory does not suffice for the state"}};
+  telling.events = events(telling.state, modem, status);
+  if (reading_.reach == Reach::running) {
+    const std::string device = modem != nullptr ? modem->device : "";
+    if (device != chosen_) telling.lines.push_back(choice(modem));
+    chosen_ = device;
+  }
+  if (!telling.events.empty()) telling.lines.push_back(told_line(telling, modem, status));
+  if (telling.events.empty() && waited) telling.lines.emplace_back("nothing has changed");
+  remember(telling.state, modem, status);
+  return telling;
 }
 
 std::vector<std::string> Facts::events(const PropertyValue& state, const Modem* modem,
@@ -103,17 +142,31 @@ std::vector<std::string> Facts::events(const PropertyValue& state, const Modem* 
   return list;
 }
 
-std::string Facts::line(const std::vector<std::string>& events, const Modem* modem, const std::string& status) const {
-  std::string text = "told ";
-  for (const std::string& event : events) text += (&event == &events.front() ? "" : ", ") + event;
-  if (reading_.reach != Reach::running) return text + ": " + text_of(reading_.reach);
-  if (modem == nullptr) return text + ": no modem";
-  text += ": modem " + modem->device;
-  if (modem->state == ModemState::starting) return text + " is starting";
-  if (modem->state == ModemState::failed) text += " failed, reason " + std::to_string(modem->failure);
-  text += ", status " + (status.empty() ? "none" : status);
-  if (!is_card_present(status)) return text;
-  return text + ", card " + shown(modem->iccid, shows_identities_) + ", subscriber " +
+std::string Facts::missing() const {
+  if (pinned_.empty()) return "";
+  return " " + pinned_ + (reading_.modems.empty() ? "" : "; there is " + devices_of(reading_));
+}
+
+// Which modem is followed from now on, and why it and no other.
+std::string Facts::choice(const Modem* modem) const {
+  if (modem == nullptr) return "following no modem any more";
+  const std::string text = "following the modem " + modem->device + ", ";
+  if (!pinned_.empty()) return text + "as --device says";
+  return text + (reading_.modems.size() == 1 ? "the only one" : "the best of " + devices_of(reading_));
+}
+
+std::string Facts::told_line(const Telling& telling, const Modem* modem, const std::string& status) const {
+  std::vector<std::string> changed;
+  for (const std::string_view field : wire::kStateFields) {
+    if (!(telling.state.get(field) == told_.get(field))) changed.emplace_back(field);
+  }
+  if (modem != nullptr && modem->numbers != told_numbers_) changed.emplace_back("numbers");
+  const std::string why = told_ ? " for " + list_of(changed) : " for the first time";
+  const std::string text = "told " + list_of(telling.events) + why + ": ";
+  if (reading_.reach != Reach::running) return text + text_of(reading_);
+  if (modem == nullptr) return text + "no modem" + missing();
+  if (!is_card_present(status)) return text + text_of(*modem);
+  return text + text_of(*modem) + ", card " + shown(modem->iccid, shows_identities_) + ", subscriber " +
          shown(modem->imsi, shows_identities_);
 }
 

@@ -11,12 +11,12 @@
 
 namespace quorvel::bridge {
 
-/// The state to serve from now on, none to leave it as it is; the events to send with it, in this order; and a line for
+/// The state to serve from now on, none to leave it as it is; the events to send with it, in this order; and lines for
 /// the log.
 struct Telling {
   PropertyValue state;
   std::vector<std::string> events;
-  std::string line;
+  std::vector<std::string> lines;
 };
 
 class Facts {
@@ -36,11 +36,13 @@ class Facts {
   [[nodiscard]] const Modem* find_chosen() const;
   [[nodiscard]] const Modem* find_best() const;
   [[nodiscard]] bool keeps_imsi(const Modem* modem) const;
+  [[nodiscard]] Telling wait(const Modem* modem, Clock::time_point now);
   [[nodiscard]] Telling tell(const Modem* modem);
   [[nodiscard]] std::vector<std::string> events(const PropertyValue& state, const Modem* modem,
                                                 const std::string& status) const;
-  [[nodiscard]] std::string line(const std::vector<std::string>& events, const Modem* modem,
-                                 const std::string& status) const;
+  [[nodiscard]] std::string missing() const;
+  [[nodiscard]] std::string choice(const Modem* modem) const;
+  [[nodiscard]] std::string told_line(const Telling& telling, const Modem* modem, const std::string& status) const;
   void remember(const PropertyValue& state, const Modem* modem, const std::string& status);
 
   std::string pinned_;

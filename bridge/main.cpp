@@ -1,78 +1,42 @@
 // quorvel-modem-bridge: a telephony service on top of ModemManager.
-#include <sys/signalfd.h>
-
-#include <CLI/CLI.hpp>
 #include <algorithm>
-#include <cerrno>
-#include <csignal>
 #include <cstdio>
-#include <cstring>
-#include <system_error>
 
 #include "bridge/facts.h"
 #include "bridge/source.h"
-#include "common/failure.h"
-#include "common/human_text.h"
-#include "common/root_option.h"
+#include "common/words.h"
 #include "platform/process.h"
 #include "telephony-service/listener.h"
+#include "telephony-service/program.h"
 #include "telephony-service/server.h"
 
 namespace quorvel::bridge {
 namespace {
 
-// As sysexits.h has them.
-constexpr int kUsage = 64;
-constexpr int kServiceUnavailable = 69;
-constexpr int kSystemError = 71;
-constexpr int kConfiguration = 78;
+constexpr const char* kName = "quorvel-modem-bridge";
 
-constexpr const char* kFooter = R"(
-Follows the modem that ModemManager found and serves /run/quorvel/telvane.sock,
-in the foreground, until SIGTERM or SIGINT. It never changes a modem.
+const tools::CommandWords kWords = {
+    kName, "Serve as the telephony service of a machine whose modem ModemManager drives",
+    "  quorvel-modem-bridge\n"
+    "  quorvel-modem-bridge --device /sys/devices/platform/soc/usb1/1-1\n"
+    "  quorvelctl sim show",
+    "Follows a modem of ModemManager's and serves /run/quorvel/telvane.sock, in the foreground, until SIGTERM or "
+    "SIGINT. "
+    "It reads, and never changes a modem. Each thing that it tells is a line on standard error.\n\n"
+    "Exit status: 0 stopped by a signal; 64 the words of the call are off; 69 another telephony service is running; 71 "
+    "the socket cannot be had; 78 the device root names no directory."};
 
-Examples:
-  quorvel-modem-bridge
-  quorvel-modem-bridge --device /sys/devices/platform/soc/usb1/1-1
-
-Exit status: 0 stopped by a signal; 64 the words of the call are off; 69 another
-telephony service is running; 71 the socket cannot be had; 78 the device root
-names no directory.)";
-
-using tools::Failure;
-
-void log_line(const std::string& text) {
-  std::fprintf(stderr, "quorvel-modem-bridge: %s\n", tools::displayable(text).c_str());
-}
-
-Descriptor open_signals() {
-  std::signal(SIGPIPE, SIG_IGN);
-  std::signal(SIGHUP, SIG_IGN);
-  sigset_t set;
-  sigemptyset(&set);
-  sigaddset(&set, SIGTERM);
-  sigaddset(&set, SIGINT);
-  ::sigprocmask(SIG_BLOCK, &set, nullptr);
-  return Descriptor(::signalfd(-1, &set, SFD_CLOEXEC | SFD_NONBLOCK));
-}
-
-platform::host::ListeningSocket open_listener() {
-  try {
-    return telephony::open_listener();
-  } catch (const std::system_error& error) {
-    if (error.code().value() == EADDRINUSE) {
-      throw Failure{kServiceUnavailable, "a telephony service is running already on " + telephony::socket_path()};
-    }
-    throw Failure{kSystemError, std::string("cannot serve ") + error.what()};
-  }
-}
+void log_line(const std::string& text) { telephony::print_line(kName, text); }
 
 class Bridge {
  public:
   Bridge(platform::host::ListeningSocket listener, Facts facts)
       : server_(std::move(listener),
                 [](std::string_view, const PropertyValue&) { return "this telephony service follows a modem"; }),
-        facts_(std::move(facts)) {}
+        facts_(std::move(facts)) {
+    // Whoever connects before the first reading sees errors, no modem that knows nothing.
+    tell(facts_.take({Reach::bus_lost, {}, 0}, Clock::now()));
+  }
 
   void serve_until(int signals) {
     for (;;) {
@@ -113,7 +77,7 @@ class Bridge {
   void tell(const Telling& telling) {
     if (telling.state && !server_.state().replace(telling.state)) return log_line("the state cannot be sent");
     for (const std::string& event : telling.events) server_.send_event(event);
-    if (!telling.line.empty()) log_line(telling.line);
+    for (const std::string& line : telling.lines) log_line(line);
   }
 
   telephony::Server server_;
@@ -122,30 +86,19 @@ class Bridge {
 };
 
 int run(int count, char** words) {
-  CLI::App app("Serve as the telephony service of a machine whose modem ModemManager drives", "quorvel-modem-bridge");
-  std::string root;
+  telephony::CallWords call(kWords);
   std::string device;
   bool shows_identities = false;
-  app.footer(kFooter);
-  app.set_version_flag("--version", "quorvel-modem-bridge " QUORVEL_VERSION, "Print the version and end");
-  app.add_option("--device", device, "Follow this modem only: its physical device, as mmcli prints it")
-      ->type_name("")
+  tools::add_word(call.app(), "--device", device, "Follow this modem only: its device, as mmcli -m any prints it")
       ->option_text("DEVICE");
-  app.add_flag("--show-identities", shows_identities, "Write card and subscriber identities to the log in full");
-  app.add_option("--root", root, "Device root: the directory that stands for the device's / (default: QUORVEL_ROOT)")
-      ->type_name("")
-      ->option_text("DIR");
-  try {
-    app.parse(count, words);
-  } catch (const CLI::ParseError& error) {
-    if (error.get_exit_code() == 0) return app.exit(error);
-    throw Failure{kUsage, std::string(error.what()) + ". See: quorvel-modem-bridge --help"};
-  }
-  tools::use_device_root(app.count("--root") > 0 ? std::optional(root) : std::nullopt, kConfiguration);
-  const Descriptor signals = open_signals();
-  if (!signals) throw Failure{kSystemError, std::string("cannot watch signals: ") + std::strerror(errno)};
-  Bridge bridge(open_listener(), Facts(device, shows_identities));
+  call.app().add_flag(
+      "--show-identities", shows_identities,
+      "Write the identities of card and subscriber to the log in full, not their last four digits alone");
+  if (!call.take(count, words)) return 0;
+  const Descriptor signals = telephony::open_end_signals();
+  auto listener = telephony::claim_listener();
   log_line("serving " + telephony::socket_path() + (device.empty() ? "" : ", for the modem " + device + " only"));
+  Bridge bridge(std::move(listener), Facts(device, shows_identities));
   platform::report_ready();
   bridge.serve_until(signals.get());
   return 0;
@@ -155,13 +108,5 @@ int run(int count, char** words) {
 }  // namespace quorvel::bridge
 
 int main(int count, char** words) {
-  try {
-    return quorvel::bridge::run(count, words);
-  } catch (const quorvel::tools::Failure& failure) {
-    quorvel::bridge::log_line(failure.message);
-    return failure.status;
-  } catch (const std::bad_alloc&) {
-    std::fputs("quorvel-modem-bridge: memory does not suffice\n", stderr);
-    return quorvel::bridge::kSystemError;
-  }
+  return quorvel::telephony::run_program(quorvel::bridge::kName, quorvel::bridge::run, count, words);
 }

@@ -7,7 +7,12 @@
 
 namespace quorvel::bridge {
 
-enum class Reach { bus_lost, not_running, running };
+enum class Reach {
+  bus_lost,
+  not_running,
+  refused,  ///< the service is there, and what it was asked fails
+  running
+};
 enum class ModemState { starting, running, no_card, card_error, failed };
 /// `none` includes locks that do not keep the card from working.
 enum class CardLock { unknown, none, pin, puk, other };
@@ -26,6 +31,7 @@ struct Modem {
 struct Reading {
   Reach reach = Reach::not_running;
   std::vector<Modem> modems;
+  int error = 0;  ///< errno of what failed, for `refused`
 };
 
 }  // namespace quorvel::bridge

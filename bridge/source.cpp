@@ -37,7 +37,8 @@ struct Unref {
 };
 using Message = std::unique_ptr<sd_bus_message, Unref>;
 
-// Does a PropertiesChanged name anything that a reading holds? One that cannot be read counts as if it did.
+// Does a PropertiesChanged name anything that a reading holds, with a new value or without? One that cannot be read
+// counts as if it did.
 bool has_relevant_change(sd_bus_message* message) {
   const char* interface = nullptr;
   if (sd_bus_message_read_basic(message, 's', &interface) < 0) return true;
@@ -48,7 +49,10 @@ bool has_relevant_change(sd_bus_message* message) {
     found |= is_modem_property(name);
     return 0;
   });
-  return found || result < 0;
+  if (found || result < 0 || sd_bus_message_enter_container(message, 'a', "s") < 0) return true;
+  const char* name = nullptr;
+  while (sd_bus_message_read_basic(message, 's', &name) > 0) found |= is_modem_property(name);
+  return found;
 }
 
 // An interface of a modem that goes or comes matters only when it is the modem's own.
@@ -117,8 +121,9 @@ void ModemManagerSource::close() {
 
 void ModemManagerSource::lose_bus(int error) {
   close();
-  if (open_delay_ == kFirstOpenDelay) trouble_ = std::string("the bus is lost: ") + std::strerror(-error);
-  complete_ = Reading{Reach::bus_lost, {}};
+  say(std::string("the bus is lost: ") + std::strerror(-error));
+  complete_ = Reading{Reach::bus_lost, {}, 0};
+  last_reach_ = Reach::bus_lost;
   open_at_ = Clock::now() + open_delay_;
   open_delay_ = std::min(open_delay_ * 2, kLongestOpenDelay);
 }
@@ -176,7 +181,7 @@ int ModemManagerSource::start_reading() {
   first_signal_.reset();
   is_stale_ = false;
   is_reading_ = true;
-  reading_ = {Reach::running, {}};
+  reading_ = {Reach::running, {}, 0};
   card_calls_.clear();
   return 0;
 }
@@ -195,12 +200,12 @@ int ModemManagerSource::on_objects(sd_bus_message* message, void* context, sd_bu
   source.open_delay_ = kFirstOpenDelay;
   if (const sd_bus_error* error = sd_bus_message_get_error(message); error != nullptr) {
     if (!says_not_running(*error)) {
-      source.fail_reading(text_of(*error));
+      source.fail_reading(text_of(*error), sd_bus_message_get_errno(message));
       return 0;
     }
     source.reading_.reach = Reach::not_running;
-  } else if (const int result = source.take_objects(message); result < 0) {
-    source.fail_reading(std::string("an answer of the wrong form: ") + std::strerror(-result));
+  } else if (source.take_objects(message) < 0) {
+    source.fail_reading("its modems have the wrong form", EBADMSG);
     return 0;
   }
   source.finish_reading();
@@ -254,22 +259,24 @@ int ModemManagerSource::on_card(sd_bus_message* message, void* context, sd_bus_e
   Modem& modem = source.reading_.modems[call->second];
   source.card_calls_.erase(call);
   const sd_bus_error* error = sd_bus_message_get_error(message);
-  const int result = error != nullptr ? 0 : take_card(message, modem);
-  if (error != nullptr || result < 0) {
-    source.fail_reading(error != nullptr ? text_of(*error) : std::string("a card of the wrong form"));
-    return 0;
+  if (error != nullptr) {
+    source.fail_reading(text_of(*error), sd_bus_message_get_errno(message));
+  } else if (take_card(message, modem) < 0) {
+    source.fail_reading("a card has the wrong form", EBADMSG);
+  } else {
+    source.finish_reading();
   }
-  source.finish_reading();
   return 0;
 }
 
-// The last reading stands meanwhile.
-void ModemManagerSource::fail_reading(const std::string& reason) {
+// A reading of modems stands meanwhile; one that says that nothing runs is wrong by now.
+void ModemManagerSource::fail_reading(const std::string& reason, int error) {
   objects_call_ = 0;
   card_calls_.clear();
   is_reading_ = false;
   if (is_stale_) return;
-  trouble_ = "cannot read ModemManager: " + reason;
+  say("cannot read ModemManager: " + reason);
+  if (last_reach_ != Reach::running) complete_ = Reading{Reach::refused, {}, error};
   read_at_ = Clock::now() + retry_delay_;
   retry_delay_ = std::min(retry_delay_ * 2, kLongestRetry);
 }
@@ -279,7 +286,16 @@ void ModemManagerSource::finish_reading() {
   if (!card_calls_.empty()) return;
   is_reading_ = false;
   retry_delay_ = std::chrono::seconds(1);
-  if (!is_stale_) complete_ = std::move(reading_);
+  if (is_stale_) return;
+  if (!said_.empty()) trouble_ = "ModemManager can be asked again";
+  said_.clear();
+  last_reach_ = reading_.reach;
+  complete_ = std::move(reading_);
+}
+
+// Trouble that lasts is said once.
+void ModemManagerSource::say(const std::string& trouble) {
+  if (trouble != said_) trouble_ = said_ = trouble;
 }
 
 }  // namespace quorvel::bridge

@@ -29,7 +29,7 @@ class ModemManagerSource {
   [[nodiscard]] std::optional<Clock::time_point> deadline() const;
   /// Goes on with whatever is due. Returns a reading when a new one is complete.
   [[nodiscard]] std::optional<Reading> serve();
-  /// Why the last reading failed, empty when there is nothing new to say; to be asked after `serve`.
+  /// What there is to say about the bus and the readings, empty when there is nothing new; to be asked after `serve`.
   [[nodiscard]] std::string take_trouble() { return std::exchange(trouble_, {}); }
 
  private:
@@ -45,8 +45,9 @@ class ModemManagerSource {
   [[nodiscard]] int take_objects(sd_bus_message* message);
   [[nodiscard]] int ask_card(const std::string& path, std::size_t modem);
   [[nodiscard]] int call(sd_bus_message* message, sd_bus_message_handler_t answered, std::uint64_t& serial);
-  void fail_reading(const std::string& reason);
+  void fail_reading(const std::string& reason, int error);
   void finish_reading();
+  void say(const std::string& trouble);
 
   sd_bus* bus_ = nullptr;
   Clock::time_point open_at_ = Clock::now();
@@ -63,7 +64,9 @@ class ModemManagerSource {
   std::uint64_t objects_call_ = 0;
   std::map<std::uint64_t, std::size_t> card_calls_;
   std::optional<Reading> complete_;
+  Reach last_reach_ = Reach::bus_lost;
   std::string trouble_;
+  std::string said_;  // the trouble that lasts
 };
 
 }  // namespace quorvel::bridge

@@ -27,14 +27,13 @@ PropertyValue data(const std::string& bytes) {
 
 PropertyValue answer(PropertyValue value) { return dictionary({{wire::kStateValueKey.text(), std::move(value)}}); }
 
-PropertyValue error(int code) {
-  return dictionary({{wire::kStateDomainKey.text(), PropertyValue::integer(std::int64_t{kFindingDomain})},
+PropertyValue error(int code, int domain = kFindingDomain) {
+  return dictionary({{wire::kStateDomainKey.text(), PropertyValue::integer(std::int64_t{domain})},
                      {wire::kStateCodeKey.text(), PropertyValue::integer(std::int64_t{code})}});
 }
 
 // Every query fails alike.
-PropertyValue failing(int code, PropertyValue connection, PropertyValue postponement) {
-  const PropertyValue pair = error(code);
+PropertyValue failing(const PropertyValue& pair, PropertyValue connection, PropertyValue postponement) {
   return dictionary({{wire::kIccidField.text(), pair},
                      {wire::kImsiField.text(), pair},
                      {wire::kGid1Field.text(), pair},
@@ -97,13 +96,15 @@ bool is_card_present(const std::string& status) {
   return !status.empty() && status != wire::kSimStatusNotInserted.text() && status != wire::kSimStatusFailed.text();
 }
 
-PropertyValue state_of(Reach reach, const Modem* modem, bool keeps_imsi) {
-  if (reach != Reach::running) {
-    const int code = reach == Reach::bus_lost ? kBusLost : kNotRunning;
-    return failing(code, error(code), error(code));
+PropertyValue state_of(const Reading& reading, const Modem* modem, bool keeps_imsi) {
+  if (reading.reach != Reach::running) {
+    const PropertyValue pair = reading.reach == Reach::refused    ? error(reading.error, kQuestionDomain)
+                               : reading.reach == Reach::bus_lost ? error(kBusLost)
+                                                                  : error(kNotRunning);
+    return failing(pair, pair, pair);
   }
-  if (modem == nullptr) return failing(kNoModem, {}, not_ready());
-  if (modem->state == ModemState::starting) return failing(kModemStarting, {}, not_ready());
+  if (modem == nullptr) return failing(error(kNoModem), {}, not_ready());
+  if (modem->state == ModemState::starting) return failing(error(kModemStarting), {}, not_ready());
   const std::string status = sim_status(*modem);
   const bool is_empty_tray = modem->state == ModemState::no_card;
   const bool is_readable = is_empty_tray || !modem->iccid.empty();

@@ -58,7 +58,7 @@ void run_once(Bytes bytes) {
     if (facts.deadline() && *facts.deadline() <= now) {
       telling = facts.take_again(now);
     } else {
-      Reading reading{static_cast<Reach>(input.number(1) % 3), {}};
+      Reading reading{static_cast<Reach>(input.number(1) % 4), {}, 5};
       for (std::uint64_t count = input.number(1) % 3; count > 0; --count) reading.modems.push_back(modem(input));
       modems = reading.modems;
       telling = facts.take(std::move(reading), now);

@@ -16,6 +16,8 @@ namespace {
 
 using platform::host::ListeningSocket;
 
+constexpr int kBacklog = 256;
+
 [[noreturn]] void fail(const std::string& what) { throw std::system_error(errno, std::generic_category(), what); }
 
 }  // namespace
@@ -24,7 +26,11 @@ std::string socket_path() { return std::string(wire::kServiceDirectory) + '/' + 
 
 ListeningSocket open_listener() {
   platform::host::settle_passed_sockets();
-  if (Descriptor passed = platform::host::take_passed_socket()) return ListeningSocket(std::move(passed));
+  if (Descriptor passed = platform::host::take_passed_socket()) {
+    // Whoever connects is shown who listened last: from now on this service, no more the service manager.
+    if (::listen(passed.get(), kBacklog) != 0) fail(socket_path());
+    return ListeningSocket(std::move(passed));
+  }
   for (const char* directory : {"/run", wire::kServiceDirectory.data()}) {
     if (platform::make_directory(directory, 0755) != 0 && errno != EEXIST) fail(directory);
   }

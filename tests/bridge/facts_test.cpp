@@ -42,9 +42,10 @@ Modem called(const std::string& device, Modem modem) {
   return modem;
 }
 
-Reading of(std::vector<Modem> modems) { return {Reach::running, std::move(modems)}; }
-const Reading kNotRunningNow = {Reach::not_running, {}};
-const Reading kBusLostNow = {Reach::bus_lost, {}};
+Reading of(std::vector<Modem> modems) { return {Reach::running, std::move(modems), 0}; }
+const Reading kNotRunningNow = {Reach::not_running, {}, 0};
+const Reading kBusLostNow = {Reach::bus_lost, {}, 0};
+const Reading kRefusedNow = {Reach::refused, {}, 13};
 
 std::string field(const PropertyValue& state, const char* name) {
   const PropertyValue& entry = state.get(name);
@@ -118,7 +119,9 @@ const Life kLives[] = {
       {4, of({ready()}), "SP" + kReadyA},
       {5, kBusLostNow, "SP - 1.6 1.6 1.6 1.6 1.6"},
       {6, kBusLostNow, ""},
-      {7, kNotRunningNow, "SP" + kGone}}},
+      {7, kNotRunningNow, "SP" + kGone},
+      {8, kRefusedNow, "SP - 2.13 2.13 2.13 2.13 2.13"},
+      {9, of({ready()}), "SP" + kReadyA}}},
     {"an IMSI never outlives its card",
      {{0, of({ready()}), "SP" + kReadyA},
       {1, of({locked(CardLock::pin, "A")}), "SP PinRequired A 1.2 <> FW -"},
@@ -182,10 +185,15 @@ TEST(Facts, FollowsThePinnedDeviceAndHidesIdentities) {
   Facts facts("b");
   const Telling telling =
       facts.take(of({called("a", ready("12345", "6")), called("b", ready("8949353", "262021"))}), {});
-  EXPECT_EQ(telling.line,
-            "told sim-status-changed, postponement-status-changed: modem b, status Ready, card ...9353, subscriber "
-            "...2021");
-  EXPECT_EQ(described(telling.state.get("postponement").get("Value").get("Status")), "Ready");
+  EXPECT_EQ(telling.lines,
+            std::vector<std::string>({"following the modem b, as --device says",
+                                      "told sim-status-changed, postponement-status-changed for the first time: SIM "
+                                      "status Ready, card ...9353, subscriber ...2021"}));
+  EXPECT_EQ(described(telling.state.get("postponement").get("Value")),
+            R"({"Status": "Ready", "IntegratedCircuitCardIdentity": "8949353", )"
+            R"("InternationalMobileSubscriberIdentity": "262021", "InternationalMobileEquipmentIdentity": "", )"
+            R"("BasebandVersion": "FW", "SIMStatus": "Ready", "PhoneNumber": "+1", "SIMGID1": <0 bytes>, )"
+            R"("SIMGID2": <0 bytes>})");
 }
 
 }  // namespace

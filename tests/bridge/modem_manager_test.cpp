@@ -25,7 +25,7 @@ class ModemManager : public testing::Test {
     ::setenv("DBUS_SYSTEM_BUS_ADDRESS", address.c_str(), 1);
     ::setenv("DBUS_SESSION_BUS_ADDRESS", address.c_str(), 1);
     start_bus();
-    bridge.emplace(MODEM_BRIDGE_PATH);
+    bridge.emplace(bridge_program());
     ASSERT_TRUE(bridge->wait_until_ready());
     observer.emplace(SocketPeer::connected_to("telvane.sock"));
     ASSERT_EQ(observer->receive()->kind, wire::FrameKind::state);

@@ -111,10 +111,14 @@ std::string built(const char* path, const char* name) {
 #ifndef QUORVELCTL_PATH
 #define QUORVELCTL_PATH nullptr
 #endif
+#ifndef QUORVEL_MODEM_BRIDGE_PATH
+#define QUORVEL_MODEM_BRIDGE_PATH ""
+#endif
 
 std::string daemon_program() { return built(QUORVELD_PATH, "quorveld"); }
 std::string simulator_program() { return built(TELVANE_SIM_PATH, "telvane-sim"); }
 std::string control_program() { return built(QUORVELCTL_PATH, "quorvelctl"); }
+std::string bridge_program() { return QUORVEL_MODEM_BRIDGE_PATH; }
 
 Program::Program(const std::string& path, const ProgramOptions& options)
     : path_(path),

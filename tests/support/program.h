@@ -10,6 +10,8 @@ namespace quorvel::test {
 [[nodiscard]] std::string daemon_program();
 [[nodiscard]] std::string simulator_program();
 [[nodiscard]] std::string control_program();
+/// Empty in a build without it, which packagers may choose.
+[[nodiscard]] std::string bridge_program();
 
 struct Outcome {
   int status = -1;  ///< the exit status, or 128 and the number of the signal that ended the program

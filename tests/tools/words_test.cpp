@@ -44,13 +44,23 @@ void expect_narrow_help(std::vector<std::string> words) {
 TEST(Words, FillNoMoreThanATerminalsLine) {
   const ScratchRoot root;
   expect_narrow_help({});
+  for (const std::string& program : {simulator_program(), bridge_program()}) {
+    if (program.empty()) continue;
+    for (const std::string& line : lines_of(output_of(program, {"--help"}))) EXPECT_LE(line.size(), 80u) << line;
+    const Outcome outcome = run_to_end(program, {"--frob"});
+    const std::string name = program.substr(program.rfind('/') + 1);
+    EXPECT_EQ(outcome.status, 64);
+    EXPECT_EQ(outcome.err, name + ": \"--frob\" is no option here. See: " + name + " --help\n");
+  }
 }
 
 TEST(Words, AreThoseOfTheManPages) {
   const ScratchRoot root;
   const std::pair<std::string, std::string> pages[] = {{control_program(), "quorvelctl.1"},
-                                                       {simulator_program(), "telvane-sim.8"}};
+                                                       {simulator_program(), "telvane-sim.8"},
+                                                       {bridge_program(), "quorvel-modem-bridge.8"}};
   for (const auto& [program, name] : pages) {
+    if (program.empty()) continue;
     std::ifstream file(QUORVEL_SOURCE_DIR "/packaging/man/" + name);
     const std::string page{std::istreambuf_iterator<char>(file), {}};
     const std::string begin = "__man\" prints.\n";

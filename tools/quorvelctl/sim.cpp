@@ -150,7 +150,8 @@ void add_field(CLI::App& command, const Words& words) {
 }
 
 void add_state_commands(CLI::App& sim, CommandLine& line, const Words& words) {
-  add(sim, line, words, {"show", "Print the simulator's present state", "  quorvelctl sim show --json"}, show_state);
+  add(sim, line, words, {"show", "Print the telephony service's present state", "  quorvelctl sim show --json"},
+      show_state);
   CLI::App* set = add(sim, line, words,
                       {"set", "Give a query a value; nobody is notified",
                        "  quorvelctl sim set gid1 '\"A1\"'\n"

@@ -20,7 +20,7 @@ PropertyValue ask(std::string_view command, const PropertyValue& argument, std::
   const client::Reply reply = client::Client(options).call(command, argument);
   if (!reply.error) return reply.value;
   if (reply.error->code == client::ErrorCode::service_failure) {
-    throw Failure{kWrongWords, "telvane-sim refuses: " + reply.error->description};
+    throw Failure{kWrongWords, "the telephony service refuses: " + reply.error->description};
   }
   throw unreachable(*reply.error, "the simulator", "telvane-sim");
 }
