@@ -1,6 +1,7 @@
 #include "core/quorvel_daemon.h"
 
 #include "files/property_list_file.h"
+#include "log/client_lines.h"
 #include "log/daemon_log.h"
 #include "platform/device_paths.h"
 #include "protocol/quorvel_protocol.h"
@@ -25,6 +26,7 @@ void invoke_copy_regulatory_images(void* object, const platform::IpcCall& call, 
     if (reply) reply.send(nullptr, &error);
     return;
   }
+  const ClientLines lines(call.caller.user, call.caller.process);
   static_cast<const QuorvelDaemon*>(object)->copyRegulatoryImagesWithCompletionBlock(reply);
 }
 

@@ -5,6 +5,7 @@
 //   notification lock   the notification center's ring; takes nothing
 //   IPC locks           the host layer's own; take nothing, never held while a request runs
 //   telephony lock      the last state that the telephony service pushed; takes nothing
+//   left-out-lines lock the lines that clients caused of late; takes nothing
 //   log lock            innermost: nothing is taken while it is held
 #pragma once
 

@@ -8,8 +8,8 @@
 namespace quorvel::test {
 namespace {
 
-const std::string kImages = std::string(kStateDirectory) + "/regulatory_images/regulatory_images.plist";
-constexpr const char* kUnreadableLine = ": Could not create dictionary from stream\n";
+const std::string kImageFolder = std::string(kStateDirectory) + "/regulatory_images";
+const std::string kImages = kImageFolder + "/regulatory_images.plist";
 constexpr auto kServiceDeadline = 5s;
 
 const PropertyValue& images() {
@@ -103,7 +103,7 @@ std::string DaemonUnderFaults::service_fault() {
   if (reply.error) return "a client is not served: " + reply.error->description;
   if (reply.value != images()) return "a client is answered with " + described(reply.value);
   const std::size_t mark = log_of(kLogFile).size();
-  root.write_file(kImages, "garbage");
+  const std::string line = provision_no_images();
   if (call(2s).error) return "a client is not served the second time";
   // Other threads log as well, and a line may have filled the log.
   std::string behind = log_of(kLogFile);
@@ -113,7 +113,7 @@ std::string DaemonUnderFaults::service_fault() {
     const std::string before = log_of(std::string(kLogFile) + ".1");
     behind.insert(0, before, std::min(mark, before.size()));
   }
-  return behind.find(kUnreadableLine) != std::string::npos ? "" : "the log does not go on";
+  return behind.find(line) != std::string::npos ? "" : "the log does not go on";
 }
 
 std::string DaemonUnderFaults::log_of(const std::string& path) const {
@@ -140,6 +140,14 @@ client::Reply DaemonUnderFaults::call(std::chrono::milliseconds timeout) const {
 }
 
 void DaemonUnderFaults::provision_images() { root.write_plist(kImages, images()); }
-void DaemonUnderFaults::provision_no_dictionary() { root.write_plist(kImages, array({"no dictionary"})); }
+
+std::string DaemonUnderFaults::provision_no_images() {
+  const mode_t mode = 0700 | (++modes_ & 077);
+  root.remove(kImages);
+  root.set_mode(kImageFolder, mode);
+  char line[16];
+  std::snprintf(line, sizeof line, " p=%o\n", S_IFDIR | mode);
+  return line;
+}
 
 }  // namespace quorvel::test

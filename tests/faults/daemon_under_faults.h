@@ -41,8 +41,9 @@ class DaemonUnderFaults {
   [[nodiscard]] client::Reply call(std::chrono::milliseconds timeout) const;
   /// What a client is answered with while the file below is in place.
   void provision_images();
-  /// Each call from now on logs a line.
-  void provision_no_dictionary();
+  /// The next call logs a line that ends like this, unlike those of the calls before, and so is not left out as a
+  /// repeated one.
+  std::string provision_no_images();
 
   ScratchRoot root;
 
@@ -55,6 +56,7 @@ class DaemonUnderFaults {
   std::string old_data_;
   std::string new_data_;
   std::unique_ptr<Program> program_;
+  mode_t modes_ = 0;
 };
 
 }  // namespace quorvel::test

@@ -150,11 +150,13 @@ class FaultSweep : public testing::Test {
     std::this_thread::sleep_for(1ms);  // the client's connection is gone from the daemon as well
   }
 
-  // A client that calls during the fault is answered or cut off, at the latest when the fault has ceased.
+  // A client that calls during the fault is answered or cut off, at the latest when the fault has ceased. Each call but
+  // the first finds no images.
   std::string call(int count) {
     std::future<bool> client = std::async(std::launch::async, [&] {
       bool hung = false;
       for (int i = 0; i < count; ++i) {
+        if (i > 0) daemon.provision_no_images();
         const client::Reply reply = daemon.call(3s);
         hung |= reply.error && reply.error->code == client::ErrorCode::timed_out;
       }
@@ -233,13 +235,14 @@ class FaultSweep : public testing::Test {
     daemon.root.write_file(kLogFile, std::string(before - 1, 'x') + '\n');
     bring_up();
     bring_up_logs = log_size() - before + 400;
-    daemon.provision_no_dictionary();
     std::size_t line = 0;
     for (std::size_t size = log_size(); size + line < kRotationThreshold; size += line) {
+      daemon.provision_no_images();
       EXPECT_FALSE(daemon.call(5s).error);
       line = log_size() - size;
       ASSERT_NE(line, 0u);
     }
+    daemon.provision_no_images();
     std::this_thread::sleep_for(1ms);
   }
 

@@ -3,6 +3,7 @@
 #include <ctime>
 #include <regex>
 
+#include "log/client_lines.h"
 #include "log/extended_logging.h"
 #include "log/log_writer.h"
 #include "log/message.h"
@@ -101,6 +102,34 @@ TEST(ExtendedLogging, IsSettledByReleaseTypeThenPreference) {
     setup_extended_logging();
     EXPECT_EQ(extended_logging, expected) << name;
   }
+}
+
+TEST(ClientLines, SayTheSameOnceASecondAndThenHowOften) {
+  ScratchRoot root;
+  const auto fail = [](int times) {
+    const ClientLines lines(12345, 678);
+    for (int i = 0; i < times; ++i) daemon_log(0, "f", "failed at %d", 1);
+  };
+  fail(3);
+  root.expect_log({"f: failed at 1"});
+  // Not of a client, and of another function: every line is written.
+  for (int i = 0; i < 2; ++i) daemon_log(0, "f", "failed at 1");
+  daemon_log(0, "g", "failed at 1");
+  root.expect_log(
+      {"daemon_log: left out 2 lines that said the same again, the last of them for a call of user 12345, "
+       "process 678",
+       "f: failed at 1", "f: failed at 1", "g: failed at 1"});
+  std::this_thread::sleep_for(1s);
+  fail(2);
+  root.expect_log({"f: failed at 1"});
+  {
+    const ClientLines lines(1, 2);
+    daemon_log(0, "f", "failed at 2");
+  }
+  root.expect_log(
+      {"daemon_log: left out 1 lines that said the same again, the last of them for a call of user 12345, "
+       "process 678",
+       "f: failed at 2"});
 }
 
 const std::string kPrevious = std::string(kLogFile) + ".1";

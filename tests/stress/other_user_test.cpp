@@ -19,6 +19,7 @@ struct Attack {
   bool observes;
   std::string first;   // what each connection sends at once
   std::string always;  // what each sends every fifth of a second
+  bool reads = false;  // and whether it takes what it is answered with
 };
 
 void PrintTo(const Attack& attack, std::ostream* out) { *out << attack.name; }
@@ -53,8 +54,9 @@ class OtherUser {
     for (;;) {
       std::size_t held = 0;
       for (Descriptor& socket : sockets) {
-        char byte = 0;
-        const bool open = socket && ::recv(socket.get(), &byte, 1, MSG_PEEK | MSG_DONTWAIT) != 0;
+        char bytes[4096];
+        const bool open = socket && ::recv(socket.get(), bytes, attack.reads ? sizeof bytes : 1,
+                                           attack.reads ? MSG_DONTWAIT : MSG_PEEK | MSG_DONTWAIT) != 0;
         if (!open) {
           socket = platform::host::connect_local(service);
           if (socket) send(socket, attack.first);
@@ -89,12 +91,16 @@ const Attack kAttacks[] = {{"Idle", false, {}, {}},
 
 }  // namespace
 
-class OtherUserTest : public StressedDaemon, public testing::WithParamInterface<Attack> {};
+class OtherUserTest : public StressedDaemon, public testing::WithParamInterface<Attack> {
+ protected:
+  void SetUp() override {
+    if (::geteuid() != 0) GTEST_SKIP() << "becoming another user takes root";
+    ASSERT_EQ(::chmod(root.outside().c_str(), 0755), 0);
+  }
+};
 
 TEST_P(OtherUserTest, TakesNobodysPlace) {
-  if (::geteuid() != 0) GTEST_SKIP() << "becoming another user takes root";
   const std::size_t limit = is_long_run() ? 4096 : 256;
-  ASSERT_EQ(::chmod(root.outside().c_str(), 0755), 0);
   provision_images(3000);
   start(static_cast<int>(limit));
   static_cast<void>(well_behaved_call());
@@ -120,6 +126,32 @@ TEST_P(OtherUserTest, TakesNobodysPlace) {
   const double grown = static_cast<double>(resident_kib(pid()) - idle_memory) / 1024;
   tell_figure(crowd + "memory above idle", "32 MiB", written(grown, "MiB"), grown <= 32);
   expect_quick_end("beside another user");
+}
+
+// Each call without images is worth four lines. As many calls as would fill both generations of the log several times.
+TEST_F(OtherUserTest, PushesNoLineOutOfTheLog) {
+  start();
+  const OtherUser other({"FailingCalls", false, {}, calls(100), true}, 16);
+  constexpr unsigned long kLinesOfTwoGenerations = 2 * 1'048'576 / 150;
+  unsigned long left_out = 0;
+  std::vector<double> waits;
+  std::string log;
+  static_cast<void>(eventually([&] {
+    waits.push_back(well_behaved_call());
+    log = root.read_file(kLogFile);
+    left_out = 0;
+    constexpr std::string_view kLeftOut = "daemon_log: left out ";
+    for (auto at = log.find(kLeftOut); at != std::string::npos; at = log.find(kLeftOut, at + 1))
+      left_out += std::stoul(log.substr(at + kLeftOut.size()));
+    return left_out > 2 * kLinesOfTwoGenerations;
+  }));
+  const bool kept = log.find("main: ") < 100 && !root.exists(std::string(kLogFile) + ".1");
+  tell_figure("another user, calls that log", "the first line is still in the log",
+              std::to_string(left_out) + " lines left out, " + std::to_string(log.size()) + " bytes of log",
+              kept && left_out > kLinesOfTwoGenerations);
+  const Latencies latencies = latencies_of(std::move(waits));
+  tell_figure("another user, calls that log: good calls", "each within 1 s", written(latencies),
+              latencies.worst <= 1000 || kInstrumented);
 }
 
 INSTANTIATE_TEST_SUITE_P(other_user, OtherUserTest, testing::ValuesIn(kAttacks), testing::PrintToStringParamName());
