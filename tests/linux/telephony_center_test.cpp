@@ -2,6 +2,8 @@
 #include <sys/socket.h>
 #include <sys/syscall.h>
 
+#include <fstream>
+
 #include "platform/telephony.h"
 #include "support/scratch_root.h"
 #include "support/socket_peer.h"
@@ -123,6 +125,7 @@ TEST_F(TelephonyService, ComesBackAfterAServiceThatLeftOrSentRubbish) {
       {std::string("\x20\0\0\0\7\0\0\0\0\0\0\0\0\0\0\0", 16), "body of 536870912 bytes"},
   };
   testing::internal::CaptureStderr();
+  const auto begin = std::chrono::steady_clock::now();
   serve([&] {
     std::size_t rounds = 0;
     for (const auto& [bytes, told] : rubbish) {
@@ -132,6 +135,8 @@ TEST_F(TelephonyService, ComesBackAfterAServiceThatLeftOrSentRubbish) {
       EXPECT_TRUE(rounds <= 2 || peer.is_closed());
     }
   });
+  // After each good frame the pauses begin with the shortest again; seven that grow would be longer.
+  EXPECT_LT(std::chrono::steady_clock::now() - begin, 6s);
   const std::string printed = testing::internal::GetCapturedStderr();
   for (const auto& [bytes, told] : rubbish) EXPECT_NE(printed.find(told), std::string::npos) << told << '\n' << printed;
   EXPECT_EQ(std::count(printed.begin(), printed.end(), '\n'), static_cast<std::ptrdiff_t>(std::size(rubbish)) - 1)
@@ -175,6 +180,29 @@ TEST_F(LateTelephonyService, IsFollowedWhenItComes) {
   });
   const std::string printed = testing::internal::GetCapturedStderr();
   EXPECT_NE(printed.find("telvane.sock as user"), std::string::npos) << printed;
+}
+
+// How long the timers of this process that are set still run, in seconds, rounded down.
+long longest_timer() {
+  long longest = 0;
+  for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fdinfo")) {
+    std::ifstream file(entry.path());
+    for (std::string line; std::getline(file, line);) {
+      long seconds = 0;
+      if (std::sscanf(line.c_str(), "it_value: (%ld,", &seconds) == 1) longest = std::max(longest, seconds);
+    }
+  }
+  return longest;
+}
+
+TEST_F(LateTelephonyService, IsLookedForAgainWithinTwoSeconds) {
+  testing::internal::CaptureStderr();
+  root.write_file("/run/quorvel/telvane.sock", "");  // nobody listens there
+  serve([&] {
+    EXPECT_TRUE(eventually([] { return longest_timer() >= 1; })) << "the pauses grow";
+    EXPECT_FALSE(eventually([] { return longest_timer() >= 2; }, 2500ms)) << "but not for ever";
+  });
+  testing::internal::GetCapturedStderr();
 }
 
 TEST_F(LateTelephonyService, IsFoundInADirectoryThatWasMadeAnew) {
