@@ -10,6 +10,7 @@ namespace {
 using namespace bridge;
 
 constexpr int kMostSteps = 200;
+constexpr int kStepsBehindTheInput = 4;
 
 std::string text(Input& input) { return std::string(as_text(input.take(input.number(1) % 5))); }
 
@@ -52,7 +53,9 @@ void run_once(Bytes bytes) {
   Facts::Clock::time_point now;
   bool was_told = false;
   std::vector<Modem> modems;
-  for (int step = 0; step < kMostSteps; ++step) {
+  int left = kStepsBehindTheInput;
+  for (int step = 0; step < kMostSteps && left > 0; ++step) {
+    left -= input.is_used_up() ? 1 : 0;
     now += std::chrono::seconds(input.number(1) % 16);
     Telling telling;
     if (facts.deadline() && *facts.deadline() <= now) {

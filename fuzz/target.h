@@ -36,6 +36,7 @@ class Input {
     return value;
   }
   [[nodiscard]] Bytes rest() { return take(rest_.size()); }
+  [[nodiscard]] bool is_used_up() const { return rest_.empty(); }
 
  private:
   Bytes rest_;

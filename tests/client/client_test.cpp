@@ -117,6 +117,8 @@ TEST_F(ClientTest, TellsWhyThereIsNoService) {
     return reply.error ? std::optional(reply.error->code) : std::nullopt;
   };
   EXPECT_EQ(error_of({}), ErrorCode::service_absent);
+  EXPECT_EQ(Client().call("operation").error->description,
+            "Cannot connect to " + kSocket + " in the device root: No such file or directory");
   root.write_file(kSocket, "no socket");
   EXPECT_EQ(error_of({}), ErrorCode::service_absent);
   EXPECT_EQ(error_of({.root = "relative"}), ErrorCode::invalid_root);

@@ -74,49 +74,52 @@ foreach(definition IN LISTS told events)
   endif()
 endforeach()
 
-# Figures that the documents repeat. Each row: a file and how it defines the figure, a document and what it says.
+# Figures that the documents repeat. Each row: how the source defines the figure, a document and what it says.
+file(GLOB_RECURSE sources ${TREE}/bridge/*.h ${TREE}/bridge/*.cpp ${TREE}/telephony-service/*.h)
+foreach(file IN LISTS sources)
+  file(READ ${file} text)
+  string(APPEND source "${text}")
+endforeach()
 set(figures
-  "src/linux/ipc/ipc_connection.h@kMaximumCallBody = 16u << 10@docs/wire.md@a call's body | 16 KiB"
-  "src/linux/ipc/ipc_worker.cpp@kHeldInputBudget = 4u << 20@docs/wire.md@all of them together | 4 MiB"
-  "src/linux/ipc/ipc_worker.cpp@kCallMilliseconds = 10'000@docs/wire.md@from a call's first byte to its last | 10 seconds"
-  "src/linux/ipc/ipc_worker.cpp@kReplyMilliseconds = 30'000@docs/wire.md@from a reply's first byte to its last | 30 seconds"
-  "src/linux/ipc/ipc_worker_accept.cpp@kUnusedMilliseconds = 100@docs/wire.md@that made no call within 100 ms"
-  "src/linux/ipc/ipc_worker.cpp@kAwakeMicroseconds = 50@docs/architecture.md@for 50 µs"
-  "src/linux/base/connection_limit.cpp@kMaximumConnections = 4096@docs/wire.md@less a reserve, and 3,072 at most"
-  "src/linux/base/connection_limit.cpp@kObserverShare = 4@docs/wire.md@a quarter as many observers"
-  "src/wire/notification_ring.h@kCapacity = 1024@docs/wire.md@remembers the newest 1,024"
-  "src/wire/telephony_state.h@kMaximumStateBody = 256u << 20@docs/wire.md@at most 256 MiB"
-  "src/wire/frame.h@kMaximumNameLength = 255@docs/wire.md@name length, up to 255"
-  "src/linux/telephony/telephony_trouble.cpp@kPause = 60'000@docs/wire.md@once a minute at most"
-  "telephony-service/peer.h@kPatience = std::chrono::seconds(5)@docs/wire.md@five seconds is cut off"
-  "src/property/limits.h@kMaximumDepth = 512@docs/property-list.md@within each other | 512 |"
-  "src/property/limits.h@kMaximumRepeatedNodes = 1'000'000@docs/property-list.md@more than once | 1,000,000 |"
-  "src/files/property_list_file.cpp@kLargestRead = 0x7ffff000@docs/property-list.md@up to 0x7ffff000 bytes"
-  "src/log/log_writer.h@kRotationThreshold = 1'048'576@docs/files.md@each up to 1 MiB"
-  "src/log/trouble_report.cpp@kInterval = 60@docs/architecture.md@once a minute at most"
-  "bridge/source.cpp@kQuiet = std::chrono::milliseconds(250)@docs/modem-bridge.md@quiet time of 250 ms"
-  "bridge/source.cpp@kLongestBurst = std::chrono::seconds(2)@docs/modem-bridge.md@2 s after the first"
-  "bridge/source.cpp@kLongestRetry = std::chrono::seconds(30)@docs/modem-bridge.md@1 s, 2 s, up to 30 s"
-  "bridge/source.cpp@kFirstOpenDelay = std::chrono::milliseconds(100)@docs/modem-bridge.md@after 0.1 s, 0.2 s"
-  "bridge/source.cpp@kLongestOpenDelay = std::chrono::milliseconds(5000)@docs/modem-bridge.md@up to 5 s"
-  "bridge/facts.cpp@kSwapPatience = std::chrono::seconds(10)@docs/modem-bridge.md@is waited for, ten seconds"
-  "bridge/facts.cpp@kStartPatience = std::chrono::seconds(30)@docs/modem-bridge.md@thirty seconds after the"
-  "bridge/state.h@kFindingDomain = 1@docs/modem-bridge.md@Error pairs are in domain 1")
+  "kMaximumCallBody = 16u << 10@docs/wire.md@a call's body | 16 KiB"
+  "kHeldInputBudget = 4u << 20@docs/wire.md@all of them together | 4 MiB"
+  "{Stage::partial, 10'000}, {Stage::sending, 30'000}}@docs/wire.md@from a call's first byte to its last | 10 seconds"
+  "{Stage::partial, 10'000}, {Stage::sending, 30'000}}@docs/wire.md@from a reply's first byte to its last | 30 seconds"
+  "kUnusedMilliseconds = 100@docs/wire.md@that made no call within 100 ms"
+  "kAwakeMicroseconds = 50@docs/architecture.md@for 50 µs"
+  "kMaximumConnections = 4096@docs/wire.md@less a reserve, and 3,072 at most"
+  "kObserverShare = 4@docs/wire.md@a quarter as many observers"
+  "kCapacity = 1024@docs/wire.md@remembers the newest 1,024"
+  "kMaximumStateBody = 256u << 20@docs/wire.md@at most 256 MiB"
+  "kMaximumNameLength = 255@docs/wire.md@name length, up to 255"
+  "kPause = 60'000@docs/wire.md@once a minute at most"
+  "kPatience = std::chrono::seconds(5)@docs/wire.md@five seconds is cut off"
+  "kMaximumDepth = 512@docs/property-list.md@within each other | 512 |"
+  "kMaximumRepeatedNodes = 1'000'000@docs/property-list.md@more than once | 1,000,000 |"
+  "kLargestRead = 0x7ffff000@docs/property-list.md@up to 0x7ffff000 bytes"
+  "kRotationThreshold = 1'048'576@docs/files.md@each up to 1 MiB"
+  "kInterval = 60@docs/architecture.md@once a minute at most"
+  "kQuiet = std::chrono::milliseconds(250)@docs/modem-bridge.md@quiet time of 250 ms"
+  "kLongestBurst = std::chrono::seconds(2)@docs/modem-bridge.md@2 s after the first"
+  "kLongestRetry = std::chrono::seconds(30)@docs/modem-bridge.md@1 s, 2 s, up to 30 s"
+  "kFirstOpenDelay = std::chrono::milliseconds(100)@docs/modem-bridge.md@after 0.1 s, 0.2 s"
+  "kLongestOpenDelay = std::chrono::milliseconds(5000)@docs/modem-bridge.md@up to 5 s"
+  "kSwapPatience = std::chrono::seconds(10)@docs/modem-bridge.md@is waited for, ten seconds"
+  "kStartPatience = std::chrono::seconds(30)@docs/modem-bridge.md@thirty seconds after the"
+  "kFindingDomain = 1@docs/modem-bridge.md@Error pairs are in domain 1")
 foreach(row IN LISTS figures)
   string(REPLACE "@" ";" row "${row}")
-  list(GET row 0 file)
-  list(GET row 1 definition)
-  list(GET row 2 document)
-  list(GET row 3 words)
-  file(READ ${TREE}/${file} defined)
+  list(GET row 0 definition)
+  list(GET row 1 document)
+  list(GET row 2 words)
   file(READ ${TREE}/${document} said)
-  string(FIND "${defined}" "${definition};" at)
+  string(FIND "${source}" "${definition};" at)
   if(at EQUAL -1)
-    message(SEND_ERROR "${file} does not define ${definition} any more: does ${document} still say \"${words}\" rightly?")
+    message(SEND_ERROR "nothing defines ${definition} any more: does ${document} still say \"${words}\" rightly?")
   endif()
   string(FIND "${said}" "${words}" at)
   if(at EQUAL -1)
-    message(SEND_ERROR "${document} does not say \"${words}\", which ${file} defines")
+    message(SEND_ERROR "${document} does not say \"${words}\", though the source has ${definition}")
   endif()
 endforeach()
 

@@ -1,5 +1,8 @@
 #include "log/daemon_log.h"
 
+#include <sys/resource.h>
+
+#include <csignal>
 #include <ctime>
 #include <regex>
 
@@ -212,6 +215,17 @@ TEST(LogWriter, TellsOfAnObstacleOnceAMinute) {
   for (int i = 0; i < 3; ++i) log_write_line("lost\n");
   EXPECT_EQ(testing::internal::GetCapturedStderr(),
             "quorveld: _safe_open: open(/var/mobile/Library/Logs/quorveld.log) failed: Is a directory\n");
+}
+
+TEST(LogWriter, TellsOfALineThatTheDiskDidNotTake) {
+  ScratchRoot root;
+  root.ignore_log();
+  std::signal(SIGXFSZ, SIG_IGN);
+  const rlimit little = {8, RLIM_INFINITY};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
+  EXPECT_EXIT(
+      (log_write_line("longer than that\n"), std::exit(log_took_last_line() ? 1 : 0)), testing::ExitedWithCode(0),
+      "^quorveld: _safe_open: write\\(/var/mobile/Library/Logs/quorveld.log\\) failed: No space left on device\n$");
 }
 
 TEST(LogWriter, ThreadsThroughRotationsKeepEveryLineWholeAndInOrder) {

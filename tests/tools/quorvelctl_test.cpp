@@ -198,6 +198,9 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   std::filesystem::create_directories(foreign + "/var");
   EXPECT_EQ(run_to_end(control_program(), {"root", "create", foreign}).status, 3);
   std::filesystem::rename(foreign + "/var", foreign + "/run");
+  std::filesystem::create_symlink("elsewhere", foreign + "/var");
+  EXPECT_EQ(run_to_end(control_program(), {"root", "create", foreign}).status, 3);
+  std::filesystem::remove(foreign + "/var");
   std::ofstream(foreign + "/etc") << "a file";
   EXPECT_EQ(run_to_end(control_program(), {"root", "create", foreign}).status, 3);
   EXPECT_FALSE(std::filesystem::exists(foreign + "/private"));
