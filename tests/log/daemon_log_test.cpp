@@ -221,10 +221,11 @@ TEST(LogWriter, TellsOfALineThatTheDiskDidNotTake) {
   ScratchRoot root;
   root.ignore_log();
   std::signal(SIGXFSZ, SIG_IGN);
-  const rlimit little = {8, RLIM_INFINITY};
+  const rlimit little = {1000, RLIM_INFINITY};
   ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
   EXPECT_EXIT(
-      (log_write_line("longer than that\n"), std::exit(log_took_last_line() ? 1 : 0)), testing::ExitedWithCode(0),
+      (log_write_line(std::string(1001, 'x').c_str()), std::exit(log_took_last_line() ? 1 : 0)),
+      testing::ExitedWithCode(0),
       "^quorveld: _safe_open: write\\(/var/mobile/Library/Logs/quorveld.log\\) failed: No space left on device\n$");
 }
 

@@ -12,7 +12,8 @@ TEST(Value, ADictionaryAgreesWithAModelThroughManyChanges) {
   PropertyValue value = PropertyValue::dictionary();
   PropertyValue kept;
   for (int step = 0; step < 20'000; ++step) {
-    const std::string key = "key" + std::to_string(random() % 300);
+    const auto which = random() % 300;
+    const std::string key = "key" + std::to_string(which) + std::string(which % 50, '.');
     if (random() % 3 == 0) {
       EXPECT_EQ(static_cast<bool>(value.remove(key)), model.erase(key) == 1);
     } else {
