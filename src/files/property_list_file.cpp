@@ -14,7 +14,7 @@
 #include "platform/flush_file.h"
 #include "platform/lock.h"
 #include "property/binary/binary.h"
-#include "property/binary/format.h"
+#include "property/binary/layout.h"
 
 namespace quorvel {
 namespace {
@@ -114,14 +114,22 @@ bool read_steady(const Descriptor& file, const char* path, struct stat status, B
   }
 }
 
-// Spares a huge file that is no property list the memory, and everybody else the wait: its first bytes tell.
-bool has_header(const Descriptor& file) noexcept {
-  char start[binary_format::kHeader.size()] = {};
+bool read_at(const Descriptor& file, std::span<std::byte> bytes, off_t offset) noexcept {
   ssize_t count = 0;
   do {
-    count = ::pread(file.get(), start, sizeof start, 0);
+    count = ::pread(file.get(), bytes.data(), bytes.size(), offset);
   } while (count < 0 && errno == EINTR);
-  return std::string_view(start, static_cast<std::size_t>(std::max<ssize_t>(count, 0))) == binary_format::kHeader;
+  return count == static_cast<ssize_t>(bytes.size());
+}
+
+// Spares a huge file that is no property list the memory, and everybody else the wait: its first bytes and its trailer,
+// held against its size, tell.
+bool has_sound_ends(const Descriptor& file, off_t size) noexcept {
+  std::byte header[binary_format::kHeader.size()];
+  std::byte trailer[binary_format::kTrailerSize];
+  std::uint64_t table = 0;
+  return read_at(file, header, 0) && read_at(file, trailer, size - static_cast<off_t>(sizeof trailer)) &&
+         detail::BinaryLayout().parse_ends(header, trailer, static_cast<std::uint64_t>(size), table);
 }
 
 PropertyValue read_value(const Descriptor& file, const char* path, const struct stat& status, Mutability mutability,
@@ -149,7 +157,7 @@ PropertyValue load(const char* path, Mutability mutability, CheckedBytes* checke
     return {};
   }
   if (status.st_size <= kLargeFile) return read_value(file, path, status, mutability, checked);
-  if (!has_header(file)) {
+  if (!has_sound_ends(file, status.st_size)) {
     daemon_log(0, kLoad, "Could not create dictionary from stream");
     return {};
   }

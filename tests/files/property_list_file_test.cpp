@@ -2,6 +2,8 @@
 
 #include <sys/resource.h>
 
+#include <fstream>
+
 #include "files/value_helpers.h"
 #include "platform/file_system.h"
 #include "support/scratch_root.h"
@@ -86,12 +88,21 @@ TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
     EXPECT_FALSE(load_dict(kFile.c_str()));
     root.expect_log({"_load_dict: Could not create dictionary from stream"});
   }
-  std::filesystem::resize_file(root.path(kFile), 1 << 30);
-  EXPECT_FALSE(load_dict(kFile.c_str()));
-  root.expect_log({"_load_dict: Could not create dictionary from stream"});
+  // A gigabyte of zeros, one with a header, and one whose trailer tells of a table beyond its end.
+  std::string trailer(32, '\0');
+  trailer[6] = trailer[7] = trailer[15] = '\1';
+  trailer[27] = '\x50';
+  const std::pair<std::string, std::string> ends[] = {{"<?xml", ""}, {"bplist00", ""}, {"bplist00", trailer}};
+  for (const auto& [first, last] : ends) {
+    root.write_file(kFile, first);
+    std::filesystem::resize_file(root.path(kFile), (1 << 30) - last.size());
+    std::ofstream(root.path(kFile), std::ofstream::binary | std::ofstream::app) << last;
+    EXPECT_FALSE(load_dict(kFile.c_str()));
+    root.expect_log({"_load_dict: Could not create dictionary from stream"});
+  }
   rusage used{};
   ASSERT_EQ(::getrusage(RUSAGE_SELF, &used), 0);
-  EXPECT_LT(used.ru_maxrss, 1 << 19) << "its first bytes are enough";
+  EXPECT_LT(used.ru_maxrss, 1 << 19) << "its first and last bytes are enough";
   std::filesystem::resize_file(root.path(kFile), 0x7ffff001);
   EXPECT_FALSE(load_mutable_dict(kFile.c_str()));
   root.expect_log({"_load_dict: too big for our purposes"});

@@ -6,20 +6,26 @@ namespace format = binary_format;
 
 bool BinaryLayout::parse(std::span<const std::byte> bytes) noexcept {
   if (bytes.size() < format::kSmallestFile) return false;
-  if (std::memcmp(bytes.data(), format::kHeader.data(), format::kHeader.size()) != 0) return false;
-  const std::uint64_t trailer_offset = bytes.size() - format::kTrailerSize;
-  const std::byte* trailer = bytes.data() + trailer_offset;
+  std::uint64_t table = 0;
+  if (!parse_ends(bytes.data(), bytes.data() + bytes.size() - format::kTrailerSize, bytes.size(), table)) return false;
   start_ = bytes.data();
+  table_ = start_ + table;
+  return true;
+}
+
+bool BinaryLayout::parse_ends(const std::byte* header, const std::byte* trailer, std::uint64_t size,
+                              std::uint64_t& table) noexcept {
+  if (std::memcmp(header, format::kHeader.data(), format::kHeader.size()) != 0) return false;
+  const std::uint64_t trailer_offset = size - format::kTrailerSize;
   offset_size_ = static_cast<std::size_t>(trailer[format::kOffsetSizeAt]);
   reference_size_ = static_cast<std::size_t>(trailer[format::kReferenceSizeAt]);
   count_ = format::get_integer(trailer + format::kObjectCountAt, 8);
   top_ = format::get_integer(trailer + format::kTopObjectAt, 8);
-  const std::uint64_t table = format::get_integer(trailer + format::kTableOffsetAt, 8);
+  table = format::get_integer(trailer + format::kTableOffsetAt, 8);
   const auto is_width = [](std::size_t width) { return width >= 1 && width <= 8; };
   if (!is_width(offset_size_) || !is_width(reference_size_)) return false;
   if (table <= format::kHeader.size() || table >= trailer_offset) return false;
   if (count_ == 0 || count_ > (trailer_offset - table) / offset_size_) return false;
-  table_ = start_ + table;
   unit_sizes_[Marker::kReference] = reference_size_;
   unit_sizes_[Marker::kEntry] = 2 * reference_size_;
   return top_ < count_;

@@ -64,6 +64,11 @@ class BinaryLayout {
  public:
   /// Takes in the trailer of `bytes`, which must outlive the layout. False when it cannot be one.
   [[nodiscard]] bool parse(std::span<const std::byte> bytes) noexcept;
+  /// Takes in the header and the trailer of a file of `size` bytes, `kSmallestFile` at least, and where its offset
+  /// table begins; nothing of the objects is there yet. False when they cannot be a header and a trailer of such a
+  /// file.
+  [[nodiscard]] bool parse_ends(const std::byte* header, const std::byte* trailer, std::uint64_t size,
+                                std::uint64_t& table) noexcept;
 
   [[nodiscard]] std::uint64_t count() const noexcept { return count_; }
   [[nodiscard]] std::uint64_t top() const noexcept { return top_; }
