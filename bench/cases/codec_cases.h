@@ -49,6 +49,30 @@ void encode_case(benchmark::State& state, std::size_t entries) {
   finish(state, given.rounds * entries, all_right && last && given.decodes(*last));
 }
 
+/// As many entries as a reply of 1 KiB has.
+inline constexpr std::size_t kReplyEntries = 18;
+
+/// Every time into the same buffer, as a thread of the daemon encodes its replies.
+template <class Codec>
+void encode_again_case(benchmark::State& state, std::size_t entries) {
+  const auto& given = material<CodecMaterial<Codec>>(entries);
+  typename Codec::Encoded used = Codec::encode(given.decoded);
+  bool all_right = true;
+  for ([[maybe_unused]] auto iteration : state) {
+    for (std::size_t round = 0; round < given.rounds; ++round) {
+      Codec::encode_again(given.decoded, used);
+      all_right &= Codec::bytes(used).size() == given.bytes().size();
+    }
+  }
+  finish(state, given.rounds * entries, all_right && given.decodes(used));
+}
+
+template <class Codec>
+bool register_encode_again() {
+  add_case("encode again", kReplyEntries, Codec::kName, encode_again_case<Codec>);
+  return true;
+}
+
 /// Times either the making of the values or their end.
 enum class Half { decode, release };
 

@@ -25,8 +25,8 @@ class MsgpackSaver {
 };
 
 // No release: nothing in a zone is counted, so that nothing can outlive the rest of it.
-[[maybe_unused]] const bool registered =
-    register_codec<MsgpackCodec>(kSize) && register_files<MsgpackSaver>(kSize, MsgpackCodec::kName);
+[[maybe_unused]] const bool registered = register_codec<MsgpackCodec>(kSize) && register_encode_again<MsgpackCodec>() &&
+                                         register_files<MsgpackSaver>(kSize, MsgpackCodec::kName);
 
 }  // namespace
 }  // namespace quorvel::bench

@@ -83,8 +83,13 @@ MsgpackCodec::Decoded MsgpackCodec::make(const DataSet& data) {
 
 MsgpackCodec::Encoded MsgpackCodec::encode(const Decoded& tree) {
   msgpack::sbuffer buffer;
-  msgpack::pack(buffer, *tree.objects);
+  encode_again(tree, buffer);
   return buffer;
+}
+
+void MsgpackCodec::encode_again(const Decoded& tree, Encoded& used) {
+  used.clear();
+  msgpack::pack(used, *tree.objects);
 }
 
 std::span<const std::byte> MsgpackCodec::bytes(const Encoded& encoded) {

@@ -23,6 +23,7 @@ struct MsgpackCodec {
 
   static Decoded make(const DataSet& data);
   static Encoded encode(const Decoded& tree);
+  static void encode_again(const Decoded& tree, Encoded& used);
   static std::span<const std::byte> bytes(const Encoded& encoded);
   static Decoded decode(std::span<const std::byte> bytes);
   static std::size_t size(const Decoded& tree) { return tree.index.size(); }

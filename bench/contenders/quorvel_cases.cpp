@@ -50,7 +50,7 @@ bool register_all() {
     register_codec<QuorvelCodec>(entries);
     register_release<QuorvelCodec>(entries);
   }
-  return register_store<ArkStore>() && register_store_growth<ArkStore>();
+  return register_encode_again<QuorvelCodec>() && register_store<ArkStore>() && register_store_growth<ArkStore>();
 }
 
 [[maybe_unused]] const bool registered = register_all();

@@ -17,8 +17,12 @@ struct QuorvelCodec {
   static Decoded make(const DataSet& data) { return to_property(data); }
   static Encoded encode(const Decoded& value) {
     ByteBuffer bytes;
-    if (!write_binary(value, bytes)) throw std::bad_alloc();
+    encode_again(value, bytes);
     return bytes;
+  }
+  static void encode_again(const Decoded& value, Encoded& used) {
+    used.clear();
+    if (!write_binary(value, used)) throw std::bad_alloc();
   }
   static std::span<const std::byte> bytes(const Encoded& encoded) { return encoded.bytes(); }
   static Decoded decode(std::span<const std::byte> bytes) { return read_binary(bytes, Mutability::immutable); }

@@ -131,6 +131,19 @@ TEST_F(IpcService, AnswersEveryCallAndKeepsTheConnection) {
   for (std::uint64_t number = 10; number < 2000; ++number) ASSERT_EQ(peer.receive()->serial, number);
 }
 
+// Each thread encodes its replies into one buffer.
+TEST(Frame, ABufferThatIsUsedAgainKeepsItsSize) {
+  const PropertyValue value = dictionary({{"key", std::string(1000, 'x')}});
+  ByteBuffer frame;
+  std::size_t capacity = 0;
+  for (int i = 0; i < 20; ++i) {
+    frame.clear();
+    ASSERT_TRUE(wire::append_frame(FrameKind::reply, 0, 1, "", value, frame));
+    if (i == 0) capacity = frame.capacity();
+  }
+  EXPECT_EQ(frame.capacity(), capacity);
+}
+
 TEST_F(IpcService, RefusesAttachedDescriptorsWhereTheKernelCan) {
   SocketPeer peer = client();
   int none = 1;

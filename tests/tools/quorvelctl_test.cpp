@@ -219,7 +219,9 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   EXPECT_NE(call({"regulatory-images", "--json"}).out.find("\"Mark\": \"CE\""), std::string::npos);
   EXPECT_EQ(call({"sim", "insert", "--iccid", "89", "--imsi", "23"}).status, 0);
   EXPECT_TRUE(monitor.wait_for_output("\"sequence\":3"));
-  EXPECT_EQ(call({"sim", "set", "gid1", "7"}).status, 0);
+  EXPECT_TRUE(call({"sim", "set", "gid1", "7"}).err.starts_with("quorvelctl: a number is set, which"));
+  EXPECT_EQ(call({"sim", "set", "postponement", "7"}).err, "");
+  EXPECT_EQ(call({"sim", "clear", "postponement"}).status, 0);
   EXPECT_EQ(call({"sim", "fail", "gid1", "1", "-5"}).status, 0);
   EXPECT_EQ(call({"sim", "show"}).out,
             "sim-status          \"Ready\"\niccid               \"89\"\nimsi                \"23\"\n"
@@ -247,6 +249,8 @@ TEST_F(Quorvelctl, TellsHowTheDaemonIs) {
     const Outcome outcome = run_to_end(control_program(), {"status"});
     EXPECT_EQ(outcome.status, status) << outcome.out << outcome.err;
     EXPECT_NE(outcome.out.find(part), std::string::npos) << outcome.out;
+    const std::string json = run_to_end(control_program(), {"status", "--json"}).out;
+    EXPECT_NE(json.find(status == 0 ? "\"well\": true" : "\"well\": false"), std::string::npos) << json;
   };
   expect_status(3, "daemon     not running. Start quorveld");
   root.write_file("/etc/quorvel/telephony", "");
