@@ -106,7 +106,7 @@ set(figures
   "kLongestOpenDelay = std::chrono::milliseconds(5000)@docs/modem-bridge.md@up to 5 s"
   "kSwapPatience = std::chrono::seconds(10)@docs/modem-bridge.md@is waited for, ten seconds"
   "kStartPatience = std::chrono::seconds(30)@docs/modem-bridge.md@thirty seconds after the"
-  "kFindingDomain = 1@docs/modem-bridge.md@Error pairs are in domain 1")
+  "kFindingDomain = 1@docs/modem-bridge.md@domain 1")
 foreach(row IN LISTS figures)
   string(REPLACE "@" ";" row "${row}")
   list(GET row 0 definition)
