@@ -250,7 +250,8 @@ TEST_F(Quorvelctl, TellsHowTheDaemonIs) {
     EXPECT_EQ(outcome.status, status) << outcome.out << outcome.err;
     EXPECT_NE(outcome.out.find(part), std::string::npos) << outcome.out;
     const std::string json = run_to_end(control_program(), {"status", "--json"}).out;
-    EXPECT_NE(json.find(status == 0 ? "\"well\": true" : "\"well\": false"), std::string::npos) << json;
+    EXPECT_TRUE(json.ends_with(status == 0 ? "  \"well\": true\n}\n" : "  \"well\": false\n}\n")) << json;
+    EXPECT_EQ(json.find("\"reason\": ") == std::string::npos, status == 0) << json;
   };
   expect_status(3, "daemon     not running. Start quorveld");
   root.write_file("/etc/quorvel/telephony", "");

@@ -54,6 +54,34 @@ TEST(Words, FillNoMoreThanATerminalsLine) {
   }
 }
 
+TEST(Words, StandInColumns) {
+  const ScratchRoot root;
+  EXPECT_EQ(output_of(control_program(), {"monitor", "--help"}),
+            R"(Print each posted notification as it arrives.
+
+Usage: quorvelctl monitor [--name PATTERN] [--count N]
+
+Goes on until it is interrupted, also when the daemon ends and is started again.
+A reader that is too slow is told how many notifications it missed.
+
+Options:
+  --name PATTERN  Only notifications of this name, in which * and ? stand for
+                  others
+  --count N       End after N notifications
+
+Options of every command:
+  --root DIR  Directory that stands for the device's / (default: QUORVEL_ROOT,
+              else /)
+  --json      Print JSON, for programs
+  -h, --help  Print this help and end
+
+Examples:
+  quorvelctl monitor
+  quorvelctl monitor --count 1 --name 'com.example.*'
+  quorvelctl monitor --json | jq -r .name
+)");
+}
+
 TEST(Words, AreThoseOfTheManPages) {
   const ScratchRoot root;
   const std::pair<std::string, std::string> pages[] = {{control_program(), "quorvelctl.1"},
