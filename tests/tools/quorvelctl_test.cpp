@@ -322,6 +322,10 @@ TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
   }
   follower.send_signal(SIGCONT);
   EXPECT_TRUE(follower.wait_for_output("five\n"));
+  // Taken away and made anew, which brings nothing back.
+  root.remove(kLogFile);
+  root.write_file(kLogFile, "anew\n");
+  EXPECT_TRUE(follower.wait_for_output("anew\n"));
   // Cut in place within a line, and grown again beyond the place where the follower stood.
   root.write_file(kLogFile, "five\nsix is not whole");
   const std::string longer = "seven is longer than all that stood there before\n";
@@ -330,7 +334,7 @@ TEST_F(Quorvelctl, FollowsTheLogThroughRotations) {
   root.write_file(kLogFile, longer);
   EXPECT_TRUE(follower.wait_for_output("before\n"));
   const Outcome outcome = follower.stop();
-  EXPECT_EQ(outcome.out, "one\ntwo\nthree\nfour\nfive\nsix is not whole\n" + longer);
+  EXPECT_EQ(outcome.out, "one\ntwo\nthree\nfour\nfive\nanew\nfive\nsix is not whole\n" + longer);
   EXPECT_EQ(outcome.status, 0);
 }
 

@@ -143,6 +143,7 @@ TEST(Words, AreRefusedInAPersonsLanguage) {
       {{"frob\033[2J"}, "\"frob\\x1b[2J\" is no command. See: quorvelctl --help"},
       {{"ark", "get"}, "KEY is missing. See: quorvelctl ark get --help"},
       {{"ark", "get", "--domain"}, "--domain needs a value behind it. See: quorvelctl ark get --help"},
+      {{"root", "create", ""}, "DIR is empty; name a directory, such as /tmp/device"},
       {{"log", "surplus"}, "\"surplus\" has no meaning here. See: quorvelctl log --help"},
       {{"log", "--nope"}, "\"--nope\" is no option here. See: quorvelctl log --help"},
       {{"--root", "/", "--root", "/", "log"}, "--root is given more than once. See: quorvelctl log --help"},

@@ -12,7 +12,9 @@ Failure unreachable(const client::Error& error, const std::string& service, cons
       message += ". Try again as the user that " + program + " runs as, or with sudo";
       break;
     case client::ErrorCode::timed_out:
-    case client::ErrorCode::disconnected: message += " Look at what it does with: quorvelctl log"; break;
+    case client::ErrorCode::disconnected:
+      message += std::string(" Look at what it does with: quorvelctl ") + (program == "quorveld" ? "log" : "status");
+      break;
     case client::ErrorCode::protocol_error:
       message += " Check that " + program + " and quorvelctl are of the same version";
       break;

@@ -19,11 +19,13 @@ std::string source_of(const LiveAnswer& fact) {
 }
 
 struct Columns {
-  std::size_t value, source;
-  bool one_line;  // sources stand beside values, but for values that are too long
+  std::size_t value;
+  std::size_t source;  // behind the value, if that leaves room
+  std::size_t below;   // otherwise on a line of its own
+  bool one_line;       // sources stand beside values, but for values that are too long
 };
 
-// Sources stand in one column behind the values, or all of them below.
+// Sources stand in one column behind the values, or all of them below, in the values' column if that leaves room.
 Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
   std::size_t key = 0, value = 0, source = 0;
   for (const LiveAnswer& fact : facts) {
@@ -34,7 +36,7 @@ Columns columns_for(const std::vector<LiveAnswer>& facts, std::size_t width) {
   }
   const std::size_t start = kIndent + key + kGap;
   const std::size_t source_start = start + value + kGap;
-  return {start, source_start, source_start + source <= width};
+  return {start, source_start, start + source <= width ? start : 2 * kIndent, source_start + source <= width};
 }
 
 void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& text) {
@@ -53,7 +55,7 @@ void append_fact(const LiveAnswer& fact, const Columns& columns, std::string& te
   if (columns.one_line && end + kGap <= columns.source) {
     text.append(columns.source - end, ' ');
   } else {
-    text.append("\n").append(columns.value, ' ');
+    text.append("\n").append(columns.below, ' ');
   }
   text.append(colours.quiet).append(source).append(colours.reset).append("\n");
 }

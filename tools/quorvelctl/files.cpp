@@ -41,7 +41,7 @@ std::string read_all(int descriptor, const std::string& path, Place place) {
   }
 }
 
-std::optional<PropertyValue> read_device_plist(const std::string& path, Links links) {
+std::optional<PropertyValue> read_device_plist(const std::string& path, Links links, const std::string& consequence) {
   // Without blocking, in case somebody put a pipe there.
   const int flags = O_RDONLY | O_NONBLOCK | (links == Links::refused ? O_NOFOLLOW : 0);
   const Descriptor file(platform::open_file(path.c_str(), flags, 0));
@@ -51,13 +51,13 @@ std::optional<PropertyValue> read_device_plist(const std::string& path, Links li
   struct stat status {};
   if (::fstat(file.get(), &status) != 0) fail_on("read", path);
   if (!S_ISREG(status.st_mode)) throw Failure{kUnreachable, path + " is not a file; move it out of the way"};
-  return parse_plist(read_all(file.get(), path), path);
+  return parse_plist(read_all(file.get(), path), path, consequence);
 }
 
-PropertyValue parse_plist(const std::string& bytes, const std::string& path) {
+PropertyValue parse_plist(const std::string& bytes, const std::string& path, const std::string& consequence) {
   PropertyValue value = read_binary(std::as_bytes(std::span(bytes)), Mutability::mutable_containers);
   if (value) return value;
-  throw Failure{kUnreachable, path + " does not hold a binary property list"};
+  throw Failure{kUnreachable, path + " does not hold a binary property list" + consequence};
 }
 
 bool is_installed_system() {

@@ -16,11 +16,13 @@ enum class Place { device, anywhere };
 enum class Links { followed, refused };
 
 /// The property list in the device's file `path`, or nothing when there is no such file. Throws Failure when it cannot
-/// be read, is no property list, or is a link where links are refused.
-[[nodiscard]] std::optional<PropertyValue> read_device_plist(const std::string& path, Links links = Links::followed);
+/// be read, is no property list (`consequence` then ends the message), or is a link where links are refused.
+[[nodiscard]] std::optional<PropertyValue> read_device_plist(const std::string& path, Links links = Links::followed,
+                                                             const std::string& consequence = {});
 
-/// The property list that `bytes` hold; throws Failure naming `path` otherwise.
-[[nodiscard]] PropertyValue parse_plist(const std::string& bytes, const std::string& path);
+/// The property list that `bytes` hold; throws Failure naming `path` and ending with `consequence` otherwise.
+[[nodiscard]] PropertyValue parse_plist(const std::string& bytes, const std::string& path,
+                                        const std::string& consequence = {});
 
 /// True when the device root is the machine's own /: the daemon is then an installed service.
 [[nodiscard]] bool is_installed_system();

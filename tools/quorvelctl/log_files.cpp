@@ -98,16 +98,18 @@ std::string LogFiles::read() {
 // At the end of `current_`: goes on to the file that follows it, or finds out whether one does.
 void LogFiles::move_on() {
   if (following_) {
+    finished_ = std::move(current_.file);
     current_ = {std::move(following_), 0, {}};
     following_ = Descriptor();
     return;
   }
   Descriptor newest = open_log(paths::kLogFile);
   if (!newest || same_file(newest, current_.file)) return;
-  // After two rotations in a row the file in between is the previous generation by now. What was written to `current_`
-  // before it was replaced is read first, on the next turn.
+  // After two rotations in a row the file in between is the previous generation by now; after a removal it is one that
+  // was read already. What was written to `current_` before it was replaced is read first, on the next turn.
   Descriptor previous = open_log(paths::kPreviousLogFile);
-  following_ = previous && !same_file(previous, current_.file) ? std::move(previous) : std::move(newest);
+  const bool is_between = previous && !same_file(previous, current_.file) && !same_file(previous, finished_);
+  following_ = is_between ? std::move(previous) : std::move(newest);
 }
 
 }  // namespace quorvel::tools

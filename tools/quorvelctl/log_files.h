@@ -31,6 +31,7 @@ class LogFiles {
 
   Reading current_;
   Descriptor following_;  // to be read when `current_` is at its end
+  Descriptor finished_;   // was read before `current_`
   bool line_is_open_ = false;
 };
 

@@ -114,6 +114,7 @@ Descriptor open_root(const std::string& path) {
 }
 
 int create_root(const std::string& path, bool json) {
+  if (path.empty()) throw Failure{kWrongWords, "DIR is empty; name a directory, such as /tmp/device"};
   const Descriptor root = open_root(path);
   const bool has_link = has_var_link(root.get(), path);
   for (const RootDirectory& directory : kDirectories) check_path(root.get(), path, directory.path);

@@ -10,9 +10,11 @@
 namespace quorvel::tools {
 
 std::optional<PropertyValue> read_saved_ark() {
-  std::optional<PropertyValue> ark = read_device_plist(paths::kDataFile, Links::refused);
+  constexpr const char* kConsequence =
+      ": the daemon starts without its values, and sets it aside when it has others to save";
+  std::optional<PropertyValue> ark = read_device_plist(paths::kDataFile, Links::refused, kConsequence);
   if (!ark || ark->is_dictionary()) return ark;
-  throw Failure{kUnreachable, std::string(paths::kDataFile) + " is not a dictionary, so the daemon does not load it"};
+  throw Failure{kUnreachable, std::string(paths::kDataFile) + " is not a dictionary" + kConsequence};
 }
 
 std::vector<SavedEntry> saved_entries(const PropertyValue& ark) {
