@@ -69,39 +69,56 @@ TEST(ProcessStart, RefusesTooFewDescriptors) {
               "^quorveld: a limit of 39 descriptors is too low, 40 are needed\n$");
 }
 
-// Numbers beyond what was passed are the daemon's own, opened later, and never taken for a passed socket.
+// Whatever the service manager passed: numbers beyond it are the daemon's own, opened later, and never taken for it.
 TEST(ProcessStart, TakesTheFirstListeningSocketOfThoseThatWerePassed) {
   ScratchRoot root;
-  const Descriptor datagram(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
-  const Descriptor stream(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  const Descriptor listening(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  const sockaddr_un unnamed = {AF_UNIX, {}};
-  ASSERT_EQ(::bind(listening.get(), reinterpret_cast<const sockaddr*>(&unnamed), sizeof unnamed.sun_family), 0);
-  ASSERT_EQ(::listen(listening.get(), 1), 0);
+  const auto local = [](int type, bool listens) {
+    Descriptor socket(::socket(AF_UNIX, type | SOCK_CLOEXEC, 0));
+    const sockaddr_un unnamed = {AF_UNIX, {}};
+    if (listens) ::bind(socket.get(), reinterpret_cast<const sockaddr*>(&unnamed), sizeof unnamed.sun_family);
+    if (listens) ::listen(socket.get(), 1);
+    return socket;
+  };
+  const Descriptor files[] = {local(SOCK_STREAM, true), local(SOCK_STREAM, true), local(SOCK_STREAM, false),
+                              local(SOCK_DGRAM, false), Descriptor(::open("/dev/null", O_RDWR | O_CLOEXEC))};
+  enum { good, second, deaf, datagram, device };
+  const std::string number =
+      "quorveld: LISTEN_FDS is \"[^\n]*\", but takes a number of passed descriptors, 1024 at most\n";
+  const auto of = [](int count, const char* trouble) {
+    return std::string("quorveld: passed descriptors \\(LISTEN_FDS\\) that ") + trouble + ": " + std::to_string(count) +
+           "\n";
+  };
   const struct {
-    const char* count;
+    const char* announced;
     std::vector<int> passed;
     int taken;  // its position, -1 for none
-    const char* line;
+    std::string lines;
   } cases[] = {
-      {"1", {listening.get()}, 0, "^$"},
-      {"3", {datagram.get(), stream.get(), listening.get()}, 2, "^$"},
-      {"2", {datagram.get(), stream.get()}, -1, "^quorveld: none of the 2 descriptors that were passed [^\n]*\n$"},
-      {"2147483647", {datagram.get()}, -1, "^quorveld: none of the 1024 descriptors [^\n]*\n$"},
-      {"x", {listening.get()}, -1, "^$"},
+      {"1", {good}, 0, ""},
+      {"0", {}, -1, ""},
+      {"4", {datagram, device, deaf, good}, 3, of(2, "are no local stream sockets") + of(1, "do not listen")},
+      {"2", {datagram, deaf}, -1, of(1, "are no local stream sockets") + of(1, "do not listen")},
+      {"2", {good, second}, 0, of(1, "could be served beside the first, which alone is")},
+      {"3", {good}, 0, of(2, "are not open")},
+      {"2147483647", {good}, 0, number + of(1023, "are not open")},
+      {"-1", {good}, -1, number},
+      {"x", {good}, -1, number},
+      {"", {good}, -1, number},
   };
   for (const auto& c : cases) {
     const auto start = [&] {
-      int number = 3;
-      for (const int passed : c.passed) ::dup2(passed, number++);
-      ::closefrom(number);
+      int next = 3;
+      std::vector<int> copies;
+      for (const int file : c.passed) copies.push_back(::fcntl(files[file].get(), F_DUPFD, 100));
+      for (const int copy : copies) ::dup2(copy, next++);
+      ::closefrom(next);
       ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1);
-      ::setenv("LISTEN_FDS", c.count, 1);
+      ::setenv("LISTEN_FDS", c.announced, 1);
       if (const int status = platform::start_process(kService); status != 0) return status;
       const Descriptor taken = platform::host::take_passed_socket();
       return taken.get() == (c.taken < 0 ? -1 : 3 + c.taken) ? 0 : 1;
     };
-    EXPECT_EXIT(::_exit(start()), ExitedWithCode(0), c.line) << c.count;
+    EXPECT_EXIT(::_exit(start()), ExitedWithCode(0), "^" + c.lines + "$") << c.announced;
   }
 }
 

@@ -1,8 +1,10 @@
 // The simulator's socket: what observers are pushed, what commands are answered, and who is cut off.
+#include <fcntl.h>
 #include <sys/socket.h>
 
 #include <fstream>
 
+#include "linux/base/local_socket.h"
 #include "platform/telephony.h"
 #include "quorvel/client.h"
 #include "support/program.h"
@@ -50,6 +52,19 @@ class TelvaneSim : public testing::Test {
   ScratchRoot root;
   std::optional<Program> simulator_;
 };
+
+TEST(PassedSockets, AreServedWhereTheyCanBe) {
+  ScratchRoot root;
+  root.make_directory("/run/quorvel");
+  const platform::host::ListeningSocket passed = platform::host::ListeningSocket::open("telvane.sock", 0600);
+  ASSERT_EQ(::fcntl(passed.get(), F_SETFD, 0), 0);
+  const std::string command = "exec 3</dev/null 4<&" + std::to_string(passed.get()) +
+                              "; LISTEN_FDS=2 LISTEN_PID=$$ exec " + simulator_program();
+  Program simulator("/bin/bash", {.arguments = {"-c", command}, .input = {}});
+  EXPECT_EQ(Observer().next(), "state {}");
+  EXPECT_EQ(simulator.stop().err, "telvane-sim: passed descriptors (LISTEN_FDS) that are no local stream sockets: 1\n");
+  EXPECT_TRUE(root.exists(kSocket)) << "its file is not the simulator's";
+}
 
 TEST_F(TelvaneSim, PushesItsStateAndTakesCommands) {
   Observer observer;

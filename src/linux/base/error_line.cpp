@@ -13,10 +13,12 @@ namespace quorvel::platform::host {
 
 namespace {
 
+const char* program_name = "quorveld";
+
 // A line is built in place, cut where it is full.
 class ErrorLine {
  public:
-  ErrorLine() noexcept { append("quorveld: "); }
+  ErrorLine() noexcept { append("%s: ", program_name); }
 
   [[gnu::format(printf, 2, 3)]] void append(const char* format, ...) noexcept {
     std::va_list arguments;
@@ -43,6 +45,8 @@ class ErrorLine {
 };
 
 }  // namespace
+
+void name_error_lines(const char* program) noexcept { program_name = program; }
 
 void print_error_line(const char* format, ...) noexcept {
   const int error = errno;

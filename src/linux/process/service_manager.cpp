@@ -12,6 +12,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -25,14 +26,14 @@ namespace {
 constexpr int kFirstPassedDescriptor = 3;
 constexpr int kMaximumPassedDescriptors = 1024;
 
-// The number in an environment variable, or 0.
-[[nodiscard]] int environment_number(const char* name) noexcept {
-  const char* value = std::getenv(name);
-  if (value == nullptr) return 0;
+// What an environment variable holds; none without it, and where it holds no number.
+[[nodiscard]] std::optional<int> number_in(const char* value) noexcept {
+  if (value == nullptr) return std::nullopt;
   const char* end = value + std::strlen(value);
   int number = 0;
   const auto [stop, error] = std::from_chars(value, end, number);
-  return error == std::errc() && stop == end ? number : 0;
+  if (error != std::errc() || stop != end) return std::nullopt;
+  return number;
 }
 
 [[nodiscard]] bool has_socket_option(int descriptor, int option, int expected) noexcept {
@@ -41,13 +42,40 @@ constexpr int kMaximumPassedDescriptors = 1024;
   return ::getsockopt(descriptor, SOL_SOCKET, option, &value, &length) == 0 && value == expected;
 }
 
-[[nodiscard]] bool is_listening_socket(int descriptor) noexcept {
-  return has_socket_option(descriptor, SO_DOMAIN, AF_UNIX) && has_socket_option(descriptor, SO_TYPE, SOCK_STREAM) &&
-         has_socket_option(descriptor, SO_ACCEPTCONN, 1);
-}
-
 // The passed descriptor that clients are accepted from, or -1. Settled before the daemon opens anything of its own.
 constinit int passed_socket = -1;
+
+// How many of the passed descriptors are of which use.
+struct Passed {
+  int missing = 0;     // not open at all
+  int foreign = 0;     // no local stream socket
+  int unlistened = 0;  // one that does not listen
+  int usable = 0;
+
+  void count(int descriptor) noexcept {
+    if (::fcntl(descriptor, F_GETFD) < 0) {
+      ++missing;
+    } else if (!has_socket_option(descriptor, SO_DOMAIN, AF_UNIX) ||
+               !has_socket_option(descriptor, SO_TYPE, SOCK_STREAM)) {
+      ++foreign;
+    } else if (!has_socket_option(descriptor, SO_ACCEPTCONN, 1)) {
+      ++unlistened;
+    } else if (usable++ == 0) {
+      passed_socket = descriptor;
+    }
+  }
+
+  // One sentence for each kind of trouble. The start goes on with what is left, or with a socket of its own.
+  void tell_troubles() const noexcept {
+    const auto tell = [](int number, const char* trouble) {
+      if (number > 0) host::print_error_line("passed descriptors (LISTEN_FDS) that %s: %d", trouble, number);
+    };
+    tell(missing, "are not open");
+    tell(foreign, "are no local stream sockets");
+    tell(unlistened, "do not listen");
+    tell(usable - 1, "could be served beside the first, which alone is");
+  }
+};
 
 [[nodiscard]] bool send_to_manager(std::string_view socket_name, std::string_view message, int flags) noexcept {
   sockaddr_un address = {};
@@ -85,17 +113,17 @@ void tell_manager(std::string_view message, int flags) noexcept {
 }  // namespace
 
 void host::settle_passed_sockets() noexcept {
-  if (environment_number("LISTEN_PID") != ::getpid()) return;
-  const int count = std::clamp(environment_number("LISTEN_FDS"), 0, kMaximumPassedDescriptors);
-  for (int descriptor = kFirstPassedDescriptor; descriptor < kFirstPassedDescriptor + count; ++descriptor) {
-    if (!is_listening_socket(descriptor)) continue;
-    passed_socket = descriptor;
-    return;
+  if (number_in(std::getenv("LISTEN_PID")) != ::getpid()) return;
+  const char* value = std::getenv("LISTEN_FDS");
+  const int announced = number_in(value).value_or(-1);
+  if (announced < 0 || announced > kMaximumPassedDescriptors) {
+    print_error_line("LISTEN_FDS is \"%s\", but takes a number of passed descriptors, %d at most",
+                     value != nullptr ? value : "", kMaximumPassedDescriptors);
   }
-  if (count > 0) {
-    print_error_line("none of the %d descriptors that were passed (LISTEN_FDS) is a listening local stream socket",
-                     count);
-  }
+  Passed passed;
+  const int count = std::clamp(announced, 0, kMaximumPassedDescriptors);
+  for (int i = 0; i < count; ++i) passed.count(kFirstPassedDescriptor + i);
+  passed.tell_troubles();
 }
 
 bool host::has_passed_socket() noexcept { return passed_socket >= 0; }

@@ -8,7 +8,8 @@
 namespace quorvel::platform::host {
 
 /// Finds out which sockets the service manager passed. To be called before anything is opened, whose number would
-/// otherwise be taken for one that was passed; says on standard error when none of them can be used. Main thread, once.
+/// otherwise be taken for one that was passed. Says on standard error, in a sentence for each kind of trouble, which of
+/// them are of no use. Main thread, once.
 void settle_passed_sockets() noexcept;
 
 /// True when the service manager passed a listening local stream socket. Main thread.
