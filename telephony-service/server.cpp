@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "platform/ipc.h"
 #include "property/binary/binary.h"
 #include "telephony-service/listener.h"
 #include "wire/failure.h"
@@ -26,7 +27,7 @@ SharedFrame reply_frame(std::uint64_t serial, const PropertyValue& value) {
 SharedFrame failure_frame(std::uint64_t serial, const std::string& description) {
   PropertyValue failure = PropertyValue::dictionary(2);
   auto frame = std::make_shared<ByteBuffer>();
-  const bool built = failure.set(wire::kFailureCodeKey, PropertyValue::integer(wire::kRefusedArgument)) &&
+  const bool built = failure.set(wire::kFailureCodeKey, PropertyValue::integer(platform::kRefusedArgument)) &&
                      failure.set(wire::kFailureDescriptionKey, PropertyValue::string(description)) &&
                      wire::append_frame(wire::FrameKind::failure, 0, serial, {}, failure, *frame);
   return built ? frame : nullptr;

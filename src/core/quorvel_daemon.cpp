@@ -22,7 +22,7 @@ PropertyValue copy_regulatory_images(CheckedBytes& bytes) noexcept {
 // The shape of a call is settled here, so that the operation itself has no error to send.
 void invoke_copy_regulatory_images(void* object, const platform::IpcCall& call, platform::IpcReply& reply) noexcept {
   if (call.argument) {
-    const platform::IpcError error{protocol::kUnexpectedArgument, "the operation takes no argument"};
+    const platform::IpcError error{platform::kRefusedArgument, "the operation takes no argument"};
     if (reply) reply.send(nullptr, &error);
     return;
   }

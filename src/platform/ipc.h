@@ -22,6 +22,11 @@ struct IpcError {
   std::string_view description;
 };
 
+/// The codes of failures that no operation of its own has: there is none of the called name; the argument is not what
+/// the operation takes. A telephony service refuses commands with the second.
+inline constexpr std::int32_t kUnknownOperation = 1;
+inline constexpr std::int32_t kRefusedArgument = 2;
+
 class IpcConnection;
 class IpcListener;
 

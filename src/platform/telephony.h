@@ -30,7 +30,16 @@ enum class TelephonyField : std::uint8_t {
   postponement,
 };
 
-/// A query's field in the service's state, and its name in the log. A new field is a row here and its enumerator.
+inline constexpr StaticText kIccidField = "iccid";
+inline constexpr StaticText kImsiField = "imsi";
+inline constexpr StaticText kFirmwareVersionField = "firmware-version";
+inline constexpr StaticText kBootloaderVersionField = "bootloader-version";
+inline constexpr StaticText kGid1Field = "gid1";
+inline constexpr StaticText kGid2Field = "gid2";
+inline constexpr StaticText kPostponementField = "postponement";
+
+/// A query's field in the service's state, and its name in the log. A new field is a row here, its enumerator and its
+/// name above.
 struct TelephonyFieldRow {
   TelephonyField field;
   std::string_view name;
@@ -38,13 +47,15 @@ struct TelephonyFieldRow {
 };
 
 inline constexpr TelephonyFieldRow kTelephonyFields[] = {
-    {TelephonyField::sim_identity, "iccid", "_TelvaneServerConnectionCopySIMIdentity"},
-    {TelephonyField::mobile_subscriber_identity, "imsi", "_TelvaneServerConnectionCopyMobileSubscriberIdentity"},
-    {TelephonyField::firmware_version, "firmware-version", "_TelvaneServerConnectionCopyFirmwareVersion"},
-    {TelephonyField::bootloader_version, "bootloader-version", "_TelvaneServerConnectionCopyBootloaderVersion"},
-    {TelephonyField::gid1, "gid1", "_TelvaneServerConnectionCopyGid1"},
-    {TelephonyField::gid2, "gid2", "_TelvaneServerConnectionCopyGid2"},
-    {TelephonyField::postponement, "postponement", "_TelvaneServerConnectionCopyPostponementStatus"},
+    {TelephonyField::sim_identity, kIccidField.text(), "_TelvaneServerConnectionCopySIMIdentity"},
+    {TelephonyField::mobile_subscriber_identity, kImsiField.text(),
+     "_TelvaneServerConnectionCopyMobileSubscriberIdentity"},
+    {TelephonyField::firmware_version, kFirmwareVersionField.text(), "_TelvaneServerConnectionCopyFirmwareVersion"},
+    {TelephonyField::bootloader_version, kBootloaderVersionField.text(),
+     "_TelvaneServerConnectionCopyBootloaderVersion"},
+    {TelephonyField::gid1, kGid1Field.text(), "_TelvaneServerConnectionCopyGid1"},
+    {TelephonyField::gid2, kGid2Field.text(), "_TelvaneServerConnectionCopyGid2"},
+    {TelephonyField::postponement, kPostponementField.text(), "_TelvaneServerConnectionCopyPostponementStatus"},
 };
 
 [[nodiscard]] constexpr const TelephonyFieldRow& row_of(TelephonyField field) noexcept {

@@ -4,7 +4,6 @@
 // one error is that of a call which does carry an argument.
 #pragma once
 
-#include <cstdint>
 #include <string_view>
 
 namespace quorvel::protocol {
@@ -14,8 +13,5 @@ inline constexpr std::string_view kInterfaceName = "QuorvelProtocol";
 
 /// The regulatory images that are provisioned on the device: a dictionary, or none when there are none.
 inline constexpr std::string_view kCopyRegulatoryImages = "copyRegulatoryImagesWithCompletionBlock:";
-
-/// The error code of a call that carries an argument.
-inline constexpr std::int32_t kUnexpectedArgument = 2;
 
 }  // namespace quorvel::protocol

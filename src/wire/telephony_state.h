@@ -5,6 +5,7 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <cstdint>
 #include <iterator>
 #include <string_view>
@@ -14,31 +15,25 @@
 
 namespace quorvel::wire {
 
+using platform::kBootloaderVersionField;
+using platform::kFirmwareVersionField;
+using platform::kGid1Field;
+using platform::kGid2Field;
+using platform::kIccidField;
+using platform::kImsiField;
+using platform::kPostponementField;
 inline constexpr StaticText kSimStatusField = "sim-status";
-inline constexpr StaticText kIccidField = "iccid";
-inline constexpr StaticText kImsiField = "imsi";
-inline constexpr StaticText kFirmwareVersionField = "firmware-version";
-inline constexpr StaticText kBootloaderVersionField = "bootloader-version";
-inline constexpr StaticText kGid1Field = "gid1";
-inline constexpr StaticText kGid2Field = "gid2";
-inline constexpr StaticText kPostponementField = "postponement";
 inline constexpr StaticText kConnectionField = "connection";
 
-// The queries' fields are named once more as texts that are values; each is its row's name.
-static_assert(kIccidField.text() == platform::kTelephonyFields[0].name &&
-              kImsiField.text() == platform::kTelephonyFields[1].name &&
-              kFirmwareVersionField.text() == platform::kTelephonyFields[2].name &&
-              kBootloaderVersionField.text() == platform::kTelephonyFields[3].name &&
-              kGid1Field.text() == platform::kTelephonyFields[4].name &&
-              kGid2Field.text() == platform::kTelephonyFields[5].name &&
-              kPostponementField.text() == platform::kTelephonyFields[6].name);
-
-/// Every field, in the order in which people are shown them.
-inline constexpr std::string_view kStateFields[] = {
-    kSimStatusField.text(),         kIccidField.text(), kImsiField.text(), kFirmwareVersionField.text(),
-    kBootloaderVersionField.text(), kGid1Field.text(),  kGid2Field.text(), kPostponementField.text(),
-    kConnectionField.text(),
-};
+/// Every field, in the order in which people are shown them: those that queries ask for stand between the other two.
+inline constexpr auto kStateFields = [] {
+  std::array<std::string_view, std::size(platform::kTelephonyFields) + 2> fields = {};
+  fields.front() = kSimStatusField.text();
+  std::transform(std::begin(platform::kTelephonyFields), std::end(platform::kTelephonyFields), fields.begin() + 1,
+                 [](const platform::TelephonyFieldRow& row) { return row.name; });
+  fields.back() = kConnectionField.text();
+  return fields;
+}();
 
 inline constexpr StaticText kStateValueKey = "Value";
 inline constexpr StaticText kStateDomainKey = "Domain";

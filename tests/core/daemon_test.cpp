@@ -1,4 +1,5 @@
 // The daemon as it is installed: start-up, the state directory, the operation, and the end.
+#include "platform/ipc.h"
 #include "protocol/quorvel_protocol.h"
 #include "quorvel/client.h"
 #include "support/program.h"
@@ -121,7 +122,7 @@ TEST_F(Daemon, AnswersWithTheRegulatoryImages) {
   const client::Reply refused = client.call(protocol::kCopyRegulatoryImages, text("argument"));
   ASSERT_TRUE(refused.error);
   EXPECT_EQ(refused.error->code, client::ErrorCode::service_failure);
-  EXPECT_EQ(refused.error->service_code, protocol::kUnexpectedArgument);
+  EXPECT_EQ(refused.error->service_code, platform::kRefusedArgument);
   EXPECT_EQ(daemon.stop().status, 0);
 }
 

@@ -82,10 +82,10 @@ void IpcConnection::run_call(const wire::Frame& frame, host::IpcOutgoing& outgoi
   PropertyValue argument;
   if (!frame.payload.empty()) argument = read_binary(frame.payload, Mutability::immutable);
   if (operation == nullptr) {
-    const IpcError error = {wire::kUnknownOperation, "there is no operation of this name"};
+    const IpcError error = {kUnknownOperation, "there is no operation of this name"};
     answer.send(nullptr, &error);
   } else if (!frame.payload.empty() && !argument) {
-    const IpcError error = {wire::kRefusedArgument, "the argument is not a binary property list"};
+    const IpcError error = {kRefusedArgument, "the argument is not a binary property list"};
     answer.send(nullptr, &error);
   } else {
     operation->invoke(object_, {argument, {peer_.user, peer_.process}}, answer);
