@@ -16,7 +16,7 @@ constexpr std::size_t kReadSize = 64u << 10;
 bool Peer::receive() {
   const std::span<std::byte> room = received_.room(kReadSize, kReadSize);
   if (room.empty()) return false;
-  const ssize_t count = ::recv(connection_.get(), room.data(), room.size(), 0);
+  const ssize_t count = platform::host::receive_bytes(connection_.get(), room);
   if (count < 0) return errno == EAGAIN || errno == EINTR;
   if (count == 0) ended_ = true;
   received_.arrived(static_cast<std::size_t>(count));

@@ -7,6 +7,8 @@
 #include <optional>
 #include <string>
 
+#include "linux/base/attached_descriptors.h"
+#include "linux/base/places.h"
 #include "platform/descriptor.h"
 #include "telephony-service/state_frames.h"
 #include "wire/frame_input.h"
@@ -26,9 +28,24 @@ class Peer {
  public:
   using Clock = std::chrono::steady_clock;
 
-  explicit Peer(Descriptor connection) noexcept : connection_(std::move(connection)) {}
+  /// Takes one of `places`, which outlive the peer.
+  Peer(Descriptor connection, platform::host::Places& places) noexcept
+      : connection_(std::move(connection)),
+        places_(places),
+        user_(platform::host::peer_of(connection_.get()).user),
+        has_place_(places.take(user_) != 0) {}
+
+  Peer(const Peer&) = delete;
+  Peer& operator=(const Peer&) = delete;
+  ~Peer() {
+    platform::host::close_connection(std::move(connection_));
+    if (has_place_) places_.give_back(user_);
+  }
 
   [[nodiscard]] int descriptor() const noexcept { return connection_.get(); }
+  [[nodiscard]] uid_t user() const noexcept { return user_; }
+  /// False when memory ran out: the peer cannot stay.
+  [[nodiscard]] bool has_place() const noexcept { return has_place_; }
 
   /// Reads what has arrived. False when the connection is of no more use.
   [[nodiscard]] bool receive();
@@ -56,6 +73,9 @@ class Peer {
   static constexpr auto kPatience = std::chrono::seconds(5);
 
   Descriptor connection_;
+  platform::host::Places& places_;
+  uid_t user_;
+  bool has_place_;
   bool ended_ = false;
   wire::FrameInput received_;
   std::deque<SharedFrame> waiting_;

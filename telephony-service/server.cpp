@@ -15,7 +15,7 @@
 namespace quorvel::telephony {
 namespace {
 
-constexpr std::size_t kMaximumPeers = 256;
+std::size_t most_peers() noexcept { return 256; }
 constexpr int kRetryMilliseconds = 100;
 constexpr int kEventsPerTurn = 1000;
 
@@ -35,9 +35,11 @@ SharedFrame failure_frame(std::uint64_t serial, const std::string& description) 
 
 }  // namespace
 
+Server::Server(platform::host::ListeningSocket listener, Command command)
+    : listener_(std::move(listener)), command_(std::move(command)), places_(most_peers) {}
+
 void Server::add_waits(std::vector<pollfd>& waits) const {
-  const bool accepts = peers_.size() < kMaximumPeers && !out_of_descriptors_;
-  waits.push_back({accepts ? listener_.get() : -1, POLLIN, 0});
+  waits.push_back({rests_ ? -1 : listener_.get(), POLLIN, 0});
   for (const Peer& peer : peers_) {
     const bool reads = !peer.ended() && !peer.job && !peer.is_behind();
     waits.push_back(
@@ -54,12 +56,12 @@ void Server::serve(std::span<const pollfd> waits) {
   carry_on_jobs();
   drop_the_slow();
   // Last, so that a new peer is not looked for among these waits.
-  out_of_descriptors_ = false;
+  rests_ = false;
   if (waits[0].revents != 0) accept_all();
 }
 
 int Server::wait_milliseconds() const {
-  auto wait = std::chrono::milliseconds(out_of_descriptors_ ? kRetryMilliseconds : -1);
+  auto wait = std::chrono::milliseconds(rests_ ? kRetryMilliseconds : -1);
   const auto now = Peer::Clock::now();
   for (const Peer& peer : peers_) {
     // A job that did not end in this turn goes on as soon as the observers allow it.
@@ -73,21 +75,41 @@ int Server::wait_milliseconds() const {
 }
 
 void Server::accept_all() {
-  while (peers_.size() < kMaximumPeers) {
+  while (places_.bear_one_more()) {
     Descriptor connection(::accept4(listener_.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
     if (!connection) {
       if (errno == EINTR || errno == ECONNABORTED) continue;
-      out_of_descriptors_ = errno != EAGAIN;
+      rests_ = errno != EAGAIN;
       return;
     }
-    if (is_trusted(connection.get())) introduce(std::move(connection));
+    platform::host::prepare_to_receive(connection.get());
+    if (is_trusted(connection.get())) {
+      introduce(std::move(connection));
+    } else {
+      platform::host::close_connection(std::move(connection));
+    }
+    if (places_.are_overfull()) make_room();
   }
+  rests_ = true;
+}
+
+// Of the user who holds most places, a connection of commands that is at rest gives way, or else the newest: those that
+// have observed for long miss nothing.
+void Server::make_room() {
+  const uid_t heaviest = places_.heaviest();
+  auto leaving = peers_.end();
+  for (auto peer = peers_.begin(); peer != peers_.end(); ++peer) {
+    if (peer->user() != heaviest) continue;
+    leaving = peer;
+    if (peer->commands && !peer->job && !peer->has_waiting()) break;
+  }
+  if (leaving != peers_.end()) peers_.erase(leaving);
 }
 
 // An observer collects the facts on an event only: one that comes late is told again of the events that matter.
 void Server::introduce(Descriptor connection) {
-  Peer& peer = peers_.emplace_back(std::move(connection));
-  bool sent = peer.send(frames_.state_frame());
+  Peer& peer = peers_.emplace_back(std::move(connection), places_);
+  bool sent = peer.has_place() && peer.send(frames_.state_frame());
   if (has_told_) {
     for (const std::string_view name : wire::kCatchUpEvents) {
       sent = sent && peer.send(frames_.event_frame(std::string(name)));

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "linux/base/local_socket.h"
+#include "linux/base/places.h"
 #include "telephony-service/peer.h"
 #include "telephony-service/state_frames.h"
 
@@ -22,8 +23,7 @@ class Server {
   /// `notify` the server carries out the rest.
   using Command = std::function<std::string(std::string_view name, const PropertyValue& argument)>;
 
-  Server(platform::host::ListeningSocket listener, Command command)
-      : listener_(std::move(listener)), command_(std::move(command)) {}
+  Server(platform::host::ListeningSocket listener, Command command);
 
   /// The state that observers are told, and that `show` answers.
   [[nodiscard]] StateFrames& state() noexcept { return frames_; }
@@ -44,6 +44,7 @@ class Server {
 
  private:
   void accept_all();
+  void make_room();
   void introduce(Descriptor connection);
   [[nodiscard]] bool serve_peer(Peer& peer, short events);
   [[nodiscard]] bool carry_out_calls(Peer& peer);
@@ -58,9 +59,10 @@ class Server {
   platform::host::ListeningSocket listener_;
   Command command_;
   StateFrames frames_;
+  platform::host::Places places_;
   std::list<Peer> peers_;
   bool has_told_ = false;  // an event was sent
-  bool out_of_descriptors_ = false;
+  bool rests_ = false;     // nobody can be accepted for a moment
 };
 
 }  // namespace quorvel::telephony

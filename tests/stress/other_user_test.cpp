@@ -1,8 +1,13 @@
 // Another user of the device, without privileges, who takes everything that can be taken.
+#include <linux/filter.h>
+#include <linux/seccomp.h>
+#include <netinet/in.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
+#include <sys/syscall.h>
+#include <sys/uio.h>
 #include <sys/wait.h>
 
 #include "linux/base/local_socket.h"
@@ -17,10 +22,50 @@ constexpr uid_t kOtherUser = 12345;
 struct Attack {
   const char* name;
   bool observes;
-  std::string first;   // what each connection sends at once
-  std::string always;  // what each sends every fifth of a second
-  bool reads = false;  // and whether it takes what it is answered with
+  std::string first;      // what each connection sends at once
+  std::string always;     // what each sends every fifth of a second
+  bool reads = false;     // and whether it takes what it is answered with
+  bool attaches = false;  // a lingering socket behind that, where the kernel does not refuse it
 };
+
+// From now on neither this process nor what it starts can ask the kernel to refuse descriptors, as before Linux 6.16.
+void become_an_older_kernel() {
+  constexpr unsigned kPassRights = 83;
+  sock_filter program[] = {
+      BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+      BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, SYS_setsockopt, 0, 3),
+      BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, args[2])),
+      BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, kPassRights, 0, 1),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | ENOPROTOOPT),
+      BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW),
+  };
+  const sock_fprog filter = {std::size(program), program};
+  ASSERT_EQ(::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0), 0);
+  ASSERT_EQ(::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &filter), 0);
+}
+
+// A socket whose last closing waits for hours, over bytes that nobody takes. The other ends stay open.
+Descriptor lingering_socket() {
+  const Descriptor listener(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  sockaddr_in address = {};
+  address.sin_family = AF_INET;
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  socklen_t size = sizeof address;
+  auto* const plain = reinterpret_cast<sockaddr*>(&address);
+  const int little = 4096;  // for the other end to take; the rest stays with the writer
+  ::setsockopt(listener.get(), SOL_SOCKET, SO_RCVBUF, &little, sizeof little);
+  if (::bind(listener.get(), plain, size) != 0 || ::listen(listener.get(), 1) != 0) ::_exit(2);
+  ::getsockname(listener.get(), plain, &size);
+  Descriptor writer(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const int room = 64 << 10;
+  ::setsockopt(writer.get(), SOL_SOCKET, SO_SNDBUF, &room, sizeof room);
+  if (::connect(writer.get(), plain, size) != 0 || ::accept(listener.get(), nullptr, nullptr) < 0) ::_exit(3);
+  const std::string bytes(4096, 'x');
+  while (::send(writer.get(), bytes.data(), bytes.size(), MSG_DONTWAIT) > 0) continue;
+  const linger hours = {1, 30'000};
+  ::setsockopt(writer.get(), SOL_SOCKET, SO_LINGER, &hours, sizeof hours);
+  return writer;
+}
 
 void PrintTo(const Attack& attack, std::ostream* out) { *out << attack.name; }
 
@@ -50,7 +95,7 @@ class OtherUser {
     ::setrlimit(RLIMIT_NOFILE, &many);
     if (::setgid(kOtherUser) != 0 || ::setuid(kOtherUser) != 0) ::_exit(1);
     const std::string_view service = attack.observes ? "notifications.sock" : "com.Orvane.quorveld.sock";
-    std::vector<Descriptor> sockets(connections);
+    std::vector<Descriptor> sockets(attack.attaches ? 8 : connections);
     for (;;) {
       std::size_t held = 0;
       for (Descriptor& socket : sockets) {
@@ -60,20 +105,48 @@ class OtherUser {
         if (!open) {
           socket = platform::host::connect_local(service);
           if (socket) send(socket, attack.first);
+          if (socket && attack.attaches) *held_ += send_attached(socket, attack.always, lingering_socket());
         } else {
           send(socket, attack.always);
         }
         held += socket ? 1 : 0;
       }
-      *held_ = held;
+      if (!attack.attaches) *held_ = held;
+      for (int i = 0; attack.attaches && attack.reads && i < 20; ++i) read_all(sockets);
       ::usleep(200'000);
+      if (attack.attaches) sockets = std::vector<Descriptor>(sockets.size());
     }
   }
   static void send(const Descriptor& socket, const std::string& bytes) {
     static_cast<void>(::send(socket.get(), bytes.data(), bytes.size(), MSG_DONTWAIT | MSG_NOSIGNAL));
   }
 
-  std::atomic<std::size_t>* held_;
+  static void read_all(const std::vector<Descriptor>& sockets) {
+    static char replies[65536];
+    for (const Descriptor& socket : sockets) {
+      while (socket && ::recv(socket.get(), replies, sizeof replies, MSG_DONTWAIT) > 0) continue;
+    }
+    ::usleep(5'000);
+  }
+
+  static std::size_t send_attached(const Descriptor& socket, std::string bytes, const Descriptor& attachment) {
+    iovec part = {bytes.data(), bytes.size()};
+    alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
+    msghdr message = {};
+    message.msg_iov = &part;
+    message.msg_iovlen = 1;
+    message.msg_control = control;
+    message.msg_controllen = sizeof control;
+    cmsghdr* const attached = CMSG_FIRSTHDR(&message);
+    attached->cmsg_level = SOL_SOCKET;
+    attached->cmsg_type = SCM_RIGHTS;
+    attached->cmsg_len = CMSG_LEN(sizeof(int));
+    const int number = attachment.get();
+    std::memcpy(CMSG_DATA(attached), &number, sizeof number);
+    return ::sendmsg(socket.get(), &message, MSG_DONTWAIT | MSG_NOSIGNAL) > 0 ? 1 : 0;
+  }
+
+  std::atomic<std::size_t>* held_;  // connections, or how often something was attached
   pid_t pid_ = -1;
 };
 
@@ -87,7 +160,10 @@ const Attack kAttacks[] = {{"Idle", false, {}, {}},
                            {"HalfCalls", false, calls(1).substr(0, 40), {}},
                            {"ActiveCalls", false, calls(1), calls(1)},
                            {"NeverReading", false, calls(400), calls(1)},
-                           {"Observers", true, {}, {}}};
+                           {"Observers", true, {}, {}},
+                           {"AttachingToCalls", false, calls(400), calls(1), true, true},
+                           {"AttachingBehindCalls", false, calls(400), calls(1), false, true},
+                           {"AttachingObservers", true, {}, "x", false, true}};
 
 }  // namespace
 
@@ -100,6 +176,7 @@ class OtherUserTest : public StressedDaemon, public testing::WithParamInterface<
 };
 
 TEST_P(OtherUserTest, TakesNobodysPlace) {
+  if (GetParam().attaches) become_an_older_kernel();
   const std::size_t limit = is_long_run() ? 4096 : 256;
   provision_images(3000);
   start(static_cast<int>(limit));

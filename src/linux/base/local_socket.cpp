@@ -25,9 +25,6 @@ constexpr int kBacklog = 256;
 // The socket is made under this suffix and renamed when it is ready.
 constexpr std::string_view kUnfinishedSuffix = ".new";
 
-// SO_PASSRIGHTS, which the C library's headers do not know yet.
-constexpr int kPassRights = 83;
-
 struct LocalAddress {
   sockaddr_un address = {};
   socklen_t length = 0;
@@ -94,13 +91,6 @@ Descriptor connect_local(std::string_view name) noexcept {
   int result = ::connect(socket.get(), address.get(), address.length);
   while (result != 0 && errno == EINTR) result = ::connect(socket.get(), address.get(), address.length);
   return result == 0 || errno == EISCONN ? std::move(socket) : Descriptor();
-}
-
-void refuse_attached_descriptors(int listener) noexcept {
-  const int error = errno;
-  constexpr int kNone = 0;
-  static_cast<void>(::setsockopt(listener, SOL_SOCKET, kPassRights, &kNone, sizeof kNone));
-  errno = error;
 }
 
 bool is_served(std::string_view name) noexcept { return connect_local(name) || errno == EAGAIN; }

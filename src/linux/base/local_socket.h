@@ -8,6 +8,7 @@
 #include <string_view>
 #include <utility>
 
+#include "linux/base/attached_descriptors.h"
 #include "platform/descriptor.h"
 
 namespace quorvel::platform::host {
@@ -19,26 +20,24 @@ namespace quorvel::platform::host {
 /// listener whose queue is full gives EAGAIN.
 [[nodiscard]] Descriptor connect_local(std::string_view name) noexcept;
 
-/// Has the kernel refuse descriptors that a client attaches to what it sends on `listener`, or on a socket accepted
-/// from it. The kernel would otherwise close them in the thread that receives or drops the message, and closing one can
-/// take as long as its owner wishes. Kernels before Linux 6.16 know no such refusal; nothing happens then. Any thread.
-void refuse_attached_descriptors(int listener) noexcept;
-
 /// True when somebody listens on the socket `name` in the service directory.
 [[nodiscard]] bool is_served(std::string_view name) noexcept;
 
-/// A listening socket. One that made its own file takes the file away when it ends, unless another file has its name by
-/// then.
+/// A listening socket that takes no attached descriptors (attached_descriptors.h). One that made its own file takes the
+/// file away when it ends, unless another file has its name by then.
 class ListeningSocket {
  public:
   ListeningSocket() noexcept = default;
-  /// Takes over a listening socket from elsewhere, which refuses attached descriptors from now on; its file stays.
+  /// Takes over a listening socket from elsewhere; its file stays.
   explicit ListeningSocket(Descriptor socket) noexcept : socket_(std::move(socket)) {
     refuse_attached_descriptors(socket_.get());
   }
   ListeningSocket(ListeningSocket&& other) noexcept { *this = std::move(other); }
   ListeningSocket& operator=(ListeningSocket&& other) noexcept;
-  ~ListeningSocket() { remove_file(); }
+  ~ListeningSocket() {
+    remove_file();
+    close_connection(std::move(socket_));
+  }
 
   /// Listens on `name` in the service directory. The file has `mode` and the directory's owner, as far as this process
   /// may give it away, before anybody can connect; one that was left behind by a dead process is replaced. Empty with

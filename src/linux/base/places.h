@@ -11,6 +11,7 @@
 #include <cstdint>
 #include <cstdlib>
 
+#include "linux/base/attached_descriptors.h"
 #include "platform/lock.h"
 
 namespace quorvel::platform::host {
@@ -43,9 +44,10 @@ class Places {
 
   /// True while there are more connections than there may be.
   [[nodiscard]] bool are_overfull() const noexcept { return count_.load(std::memory_order_relaxed) > limit_(); }
-  /// True while one more may be let in before somebody else has given way. The reserve of descriptors bears a few.
+  /// True while one more may be let in before somebody else has given way, for whom the reserve of descriptors
+  /// suffices.
   [[nodiscard]] bool bear_one_more() const noexcept {
-    return count_.load(std::memory_order_relaxed) < limit_() + kAboveLimit;
+    return count_.load(std::memory_order_relaxed) + closing_connections() < limit_() + kAboveLimit;
   }
   /// The user who holds most places; -1 when nobody holds any.
   [[nodiscard]] uid_t heaviest() noexcept;

@@ -4,6 +4,7 @@
 
 #include <cerrno>
 
+#include "linux/base/attached_descriptors.h"
 #include "linux/base/monotonic_clock.h"
 
 namespace quorvel::platform::host {
@@ -34,6 +35,7 @@ void RestingListener::listen() noexcept {
 Descriptor RestingListener::accept() noexcept {
   for (;;) {
     Descriptor connection(::accept4(socket_, nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
+    if (connection) prepare_to_receive(connection.get());
     if (connection || errno == EAGAIN) return connection;
     if (errno == EINTR || errno == ECONNABORTED) continue;
     const int error = errno;

@@ -15,9 +15,15 @@ constexpr std::size_t kStackSize = 1u << 20;
 
 constexpr std::int64_t kPatienceMilliseconds = 500;
 
+std::int64_t end_of_the_process = 0;  // 0 while nothing has told it to end
+
 }  // namespace
 
-std::int64_t end_of_patience() noexcept { return monotonic_milliseconds() + kPatienceMilliseconds; }
+void begin_to_end() noexcept { end_of_the_process = monotonic_milliseconds() + kPatienceMilliseconds; }
+
+std::int64_t end_of_patience() noexcept {
+  return end_of_the_process != 0 ? end_of_the_process : monotonic_milliseconds() + kPatienceMilliseconds;
+}
 
 // Asked again and again: the calls that wait until a given time go by a clock that may be set meanwhile, or are not
 // known to the thread sanitizer.

@@ -9,8 +9,10 @@ namespace quorvel::platform::host {
 /// Starts a thread with a stack of fixed size. Returns 0 or an error number. The caller joins the thread.
 [[nodiscard]] int start_thread(pthread_t& thread, void* (*run)(void*), void* argument) noexcept;
 
-/// By when threads that were told to end must have ended, all of them together: half a second from now, in
-/// milliseconds of the monotonic clock.
+/// Says that the process begins to end, from when its threads have half a second in all. Main thread, as below.
+void begin_to_end() noexcept;
+/// By when threads that were told to end must have ended, in milliseconds of the monotonic clock: half a second from
+/// the beginning of the process's end, or where the process goes on, from now.
 [[nodiscard]] std::int64_t end_of_patience() noexcept;
 
 /// Waits for a thread's end, but not beyond `deadline`: a thread that waits for a hung disk, or for a descriptor that

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <span>
 
+#include "linux/base/attached_descriptors.h"
 #include "linux/base/intrusive_list.h"
 #include "linux/base/places.h"
 #include "platform/descriptor.h"
@@ -34,10 +35,11 @@ class IpcConnection : public host::ListLink {
 
   explicit IpcConnection(Descriptor socket) noexcept
       : socket_(std::move(socket)), peer_(host::peer_of(socket_.get())) {}
+  ~IpcConnection() { close(); }
 
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
   [[nodiscard]] const host::Peer& peer() const noexcept { return peer_; }
-  void close() noexcept { socket_ = Descriptor(); }
+  void close() noexcept { host::close_connection(std::move(socket_)); }
 
   void set_interface(const IpcInterface* interface) noexcept { interface_ = interface; }
   void set_object(void* object) noexcept { object_ = object; }

@@ -1,7 +1,6 @@
 #include "linux/ipc/ipc_worker.h"
 
 #include <sched.h>
-#include <sys/socket.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -182,7 +181,7 @@ void IpcWorker::serve(IpcConnection& connection) noexcept {
 
 // Reads once. Bytes are looked at where they were received; a connection keeps only what is left of them.
 void IpcWorker::receive(IpcConnection& connection) noexcept {
-  const ssize_t count = ::recv(connection.descriptor(), room_, sizeof room_, MSG_DONTWAIT);
+  const ssize_t count = receive_bytes(connection.descriptor(), room_);
   if (count < 0) {
     if (errno != EAGAIN && errno != EINTR) close(connection);
     return;
@@ -288,6 +287,7 @@ void IpcWorker::bound_held_input() noexcept {
 
 void IpcWorker::close(IpcConnection& connection) noexcept {
   if (connection.stage == Stage::closed) return;
+  if (connection.interest != 0) queue_.remove(connection.descriptor());
   connection.close();
   connection.input.clear();
   note_held_input(connection);

@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "linux/base/attached_descriptors.h"
 #include "linux/base/intrusive_list.h"
 #include "linux/base/places.h"
 #include "platform/descriptor.h"
@@ -19,6 +20,8 @@ class NotificationObserver : public ListLink {
 
   /// Greets the observer with `position`: it receives what comes after.
   NotificationObserver(Descriptor socket, std::uint64_t position) noexcept;
+
+  ~NotificationObserver() { close_connection(std::move(socket_)); }
 
   [[nodiscard]] int descriptor() const noexcept { return socket_.get(); }
   [[nodiscard]] uid_t user() const noexcept { return user_; }

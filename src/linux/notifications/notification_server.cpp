@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <new>
+#include <utility>
 
 #include "linux/base/error_line.h"
 #include "linux/base/monotonic_clock.h"
@@ -17,6 +18,7 @@ bool NotificationServer::start() noexcept {
   if (queue_.open_with_bell()) {
     errno = start_thread(thread_, run_thread, this);
     if (errno == 0) {
+      started_ = true;
       running_.store(true, std::memory_order_release);
       return true;
     }
@@ -28,11 +30,16 @@ bool NotificationServer::start() noexcept {
   return false;
 }
 
-void NotificationServer::stop() noexcept {
+void NotificationServer::begin_to_stop() noexcept {
   if (!running_.exchange(false)) return;
   socket_.remove_file();
   stopping_.store(true, std::memory_order_release);
   queue_.ring();
+}
+
+void NotificationServer::stop() noexcept {
+  begin_to_stop();
+  if (!std::exchange(started_, false)) return;
   if (!join_thread(thread_, end_of_patience())) print_error_line("the thread of the notification center does not end");
 }
 
@@ -98,6 +105,7 @@ void NotificationServer::serve(NotificationObserver& observer) noexcept {
 }
 
 void NotificationServer::remove(NotificationObserver& observer) noexcept {
+  queue_.remove(observer.descriptor());
   places_.give_back(observer.user());
   delete &observer;
   listener_.end_rest();
@@ -114,10 +122,13 @@ void NotificationServer::forget_served() noexcept {
 }
 
 void NotificationServer::accept_all() noexcept {
-  while (Descriptor socket = listener_.accept()) {
-    if (!take_in(std::move(socket))) return listener_.rest();
+  while (places_.bear_one_more()) {
+    Descriptor socket = listener_.accept();
+    if (!socket) return;
+    if (!take_in(std::move(socket))) break;
     if (places_.are_overfull()) make_room();
   }
+  listener_.rest();
 }
 
 // Of the user who has most observers, the newest gives way: those that have listened for long miss nothing.

@@ -23,9 +23,11 @@ class NotificationServer {
   NotificationServer& operator=(const NotificationServer&) = delete;
   ~NotificationServer() { stop(); }
 
-  /// Opens the socket and starts the thread. False with errno set. Main thread, as is `stop`.
+  /// Opens the socket and starts the thread. False with errno set. Main thread, as are the next two.
   [[nodiscard]] bool start() noexcept;
-  /// Sends what observers can take at once, stops the thread and takes the socket away.
+  /// Takes the socket away and tells the thread to end, after it has sent what observers can take at once.
+  void begin_to_stop() noexcept;
+  /// The same, and waits for the thread's end, but no longer than its process may take to end.
   void stop() noexcept;
 
   /// Passes an encoded notification on, or, where it is empty, that one could not be encoded. Never waits. Any thread.
@@ -50,6 +52,7 @@ class NotificationServer {
   ListeningSocket socket_;
   EventQueue queue_;
   pthread_t thread_ = {};
+  bool started_ = false;
   std::atomic<bool> running_ = false;
   std::atomic<bool> stopping_ = false;
   std::atomic<bool> woken_ = false;  // a wake-up is on its way that will see everything posted so far

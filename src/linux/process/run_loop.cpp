@@ -8,6 +8,8 @@
 #include <csignal>
 #include <new>
 
+#include "linux/base/thread.h"
+#include "linux/notifications/notification_server.h"
 #include "linux/process/run_loop_source.h"
 
 namespace quorvel::platform {
@@ -83,6 +85,11 @@ RunLoop* main_run_loop() noexcept {
 
 RunLoop* current_run_loop() noexcept { return ::gettid() == ::getpid() ? main_run_loop() : nullptr; }
 
-void run_main_run_loop() noexcept { main_run_loop()->run(); }
+// The observers' thread is told to end at once, so that it ends while others do.
+void run_main_run_loop() noexcept {
+  main_run_loop()->run();
+  host::begin_to_end();
+  host::notification_server().begin_to_stop();
+}
 
 }  // namespace quorvel::platform
