@@ -17,7 +17,7 @@ declare -A packages=(
   [cross-arm64]="g++-aarch64-linux-gnu"
   [arm64]="qemu-system-arm cpio"
   [elsewhere]="debootstrap"
-  [installed]="debootstrap systemd-container"
+  [installed]="debootstrap systemd-container procps bsdextrautils"
   # The contenders of the benchmarks.
   [contenders]="libmsgpack-cxx-dev libglib2.0-dev libabsl-dev libspdlog-dev libsystemd-dev dbus-daemon redis-server"
 )
