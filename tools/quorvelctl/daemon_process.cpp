@@ -5,7 +5,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cmath>
+#include <csignal>
 #include <cstdlib>
 #include <ctime>
 #include <filesystem>
@@ -24,61 +26,21 @@ constexpr pid_t kServiceManager = 1;
 
 std::string proc_path(pid_t process, const char* name) { return "/proc/" + std::to_string(process) + '/' + name; }
 
-// A line of a process's list of local sockets.
-struct LocalSocket {
-  std::string flags, type, state, inode, path;
-  [[nodiscard]] bool listens() const { return flags == "00010000"; }
-  [[nodiscard]] bool is_connected_stream() const { return type == "0001" && state == "03"; }
-  // As descriptors' links in /proc name it.
-  [[nodiscard]] std::string link() const { return "socket:[" + inode + ']'; }
-};
-
-// The links of the sockets in a process's network that `wanted` is true of; nothing where /proc does not tell.
-template <typename Wanted>
-std::optional<std::set<std::string>> sockets_of(pid_t process, Wanted wanted) {
-  std::set<std::string> links;
+// The stream sockets in a process's network that are connected and have no name: a connection that a service accepted
+// has the service's name. Nothing where /proc does not tell.
+std::optional<std::set<std::string>> unnamed_connections(pid_t process) {
+  std::set<std::string> inodes;
   std::ifstream table(proc_path(process, "net/unix"));
   if (!table) return std::nullopt;
   std::string line;
   std::getline(table, line);
   while (std::getline(table, line)) {
     std::istringstream columns(line);
-    std::string number, references, protocol;
-    LocalSocket socket;
-    columns >> number >> references >> protocol >> socket.flags >> socket.type >> socket.state >> socket.inode;
-    std::getline(columns >> std::ws, socket.path);
-    if (wanted(socket)) links.insert(socket.link());
+    std::string number, references, protocol, flags, type, state, inode, path;
+    columns >> number >> references >> protocol >> flags >> type >> state >> inode >> path;
+    if (type == "0001" && state == "03" && path.empty()) inodes.insert("socket:[" + inode + ']');
   }
-  return links;
-}
-
-// Whether a process holds one of the sockets behind its standard streams, which are the caller's or the journal's;
-// nothing where the caller may not look.
-std::optional<bool> holds_one_of(pid_t process, const std::set<std::string>& links) {
-  std::error_code error;
-  bool found = false;
-  std::filesystem::directory_iterator entry(proc_path(process, "fd"), error);
-  if (error) return std::nullopt;
-  for (; entry != std::filesystem::directory_iterator(); entry.increment(error)) {
-    const std::string name = entry->path().filename().string();
-    std::error_code gone;
-    const std::string target = std::filesystem::read_symlink(entry->path(), gone).string();
-    if (!(name.size() == 1 && name <= "2") && !gone && links.contains(target)) found = true;
-  }
-  return found;
-}
-
-// A service manager that listens for a service is its peer; the service holds the socket as well once it runs.
-pid_t holder_of(const char* path) {
-  const auto links = sockets_of(1, [path](const LocalSocket& one) { return one.listens() && one.path == path; });
-  std::error_code error;
-  std::filesystem::directory_iterator entry("/proc", error);
-  if (!links || links->empty() || error) return kServiceManager;
-  for (; entry != std::filesystem::directory_iterator(); entry.increment(error)) {
-    const pid_t process = std::atoi(entry->path().filename().c_str());
-    if (process > kServiceManager && holds_one_of(process, *links).value_or(false)) return process;
-  }
-  return kServiceManager;
+  return inodes;
 }
 
 }  // namespace
@@ -98,8 +60,7 @@ Server server_of(std::string_view service) {
   ucred peer{};
   socklen_t size = sizeof peer;
   if (::getsockopt(socket.descriptor(), SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) peer = {};
-  const bool is_managed = peer.pid == kServiceManager && peer.uid == 0;
-  return {Server::State::serving, is_managed ? holder_of(socket.path()) : peer.pid, peer.uid, {}};
+  return {Server::State::serving, peer.pid, peer.uid, {}};
 }
 
 bool is_believed(const Server& service) {
@@ -114,6 +75,8 @@ std::string user_name(uid_t user) {
   return entry != nullptr ? entry->pw_name : std::to_string(user);
 }
 
+bool has_ended(const Server& server) { return server.process > 0 && ::kill(server.process, 0) != 0 && errno == ESRCH; }
+
 std::string program_of(pid_t process) {
   std::ifstream file(proc_path(process, "cmdline"));
   std::string program;
@@ -123,7 +86,7 @@ std::string program_of(pid_t process) {
 
 std::string name_of(const Server& server) {
   if (server.process <= 0) return "a process of user " + user_name(server.user);
-  if (server.process == kServiceManager) return "a service of the service manager, process 1";
+  if (server.process == kServiceManager) return "a service that the service manager starts";
   const std::string program = program_of(server.process);
   return program + (program.empty() ? "" : ", ") + "process " + std::to_string(server.process) + " of user " +
          user_name(server.user);
@@ -148,10 +111,19 @@ std::optional<double> start_of(pid_t process) {
 }
 
 std::optional<bool> follows_telephony(pid_t daemon) {
-  // A connection that a service accepted has the service's name, one of the process's own making has none.
-  const auto own = [](const LocalSocket& one) { return one.is_connected_stream() && one.path.empty(); };
-  const std::optional<std::set<std::string>> connections = sockets_of(daemon, own);
-  return connections ? holds_one_of(daemon, *connections) : std::nullopt;
+  const std::optional<std::set<std::string>> connections = unnamed_connections(daemon);
+  std::error_code error;
+  bool found = false;
+  std::filesystem::directory_iterator entry(proc_path(daemon, "fd"), error);
+  if (error || !connections) return std::nullopt;
+  for (; entry != std::filesystem::directory_iterator(); entry.increment(error)) {
+    // The first three are the caller's or the journal's.
+    const bool standard = entry->path().filename().string() <= "2" && entry->path().filename().string().size() == 1;
+    std::error_code gone;
+    const std::string target = std::filesystem::read_symlink(entry->path(), gone).string();
+    if (!standard && !gone && connections->contains(target)) found = true;
+  }
+  return found;
 }
 
 }  // namespace quorvel::tools

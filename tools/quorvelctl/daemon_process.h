@@ -13,7 +13,7 @@ namespace quorvel::tools {
 struct Server {
   enum class State { absent, refused, unreachable, serving };
   State state = State::absent;
-  pid_t process = 0;   // 0 where it is not known, 1 where a service manager listens and hides who serves
+  pid_t process = 0;   // 0 where it is not known, 1 where a service manager listens for one to come
   uid_t user = 0;      // who listens
   std::string reason;  // why nobody was reached
 };
@@ -26,6 +26,9 @@ struct Server {
 
 /// A user's name, or the number of one without a name.
 [[nodiscard]] std::string user_name(uid_t user);
+
+/// True when the process that listened has ended, and another one, such as a service manager, keeps its socket.
+[[nodiscard]] bool has_ended(const Server& server);
 
 /// The name of a process's program, empty where /proc does not tell it.
 [[nodiscard]] std::string program_of(pid_t process);

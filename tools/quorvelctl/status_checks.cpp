@@ -125,6 +125,12 @@ Finding check_telephony(const Server& daemon) {
   const Server service = server_of("telvane");
   const std::optional<bool> followed = daemon.process > 0 ? follows_telephony(daemon.process) : false;
   if (followed) put(finding.facts, "followed", PropertyValue::boolean(*followed));
+  if (service.state == Server::State::serving && has_ended(service)) {
+    finding.verdict = Verdict::ill;
+    finding.reason = "process " + std::to_string(service.process) + ", which served it, has ended";
+    finding.lines.push_back(finding.reason);
+    return finding;
+  }
   if (followed.value_or(false)) {
     finding.lines.emplace_back("followed");
   } else if (!followed && service.state != Server::State::absent && !is_foreign(service)) {
