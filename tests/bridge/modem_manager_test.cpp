@@ -2,9 +2,7 @@
 #include <systemd/sd-bus.h>
 
 #include "bridge/fake_modem.h"
-#include "support/program.h"
-#include "support/scratch_root.h"
-#include "support/socket_peer.h"
+#include "bridge/life.h"
 
 namespace quorvel::test {
 namespace {
@@ -12,31 +10,27 @@ namespace {
 constexpr const char* kDaemon = "/usr/bin/dbus-daemon";
 constexpr const char* kManager = "/usr/sbin/ModemManager";
 constexpr const char* kName = "org.freedesktop.ModemManager1";
+constexpr const char* kCardOfFirst = "989453230000000010F1";
+constexpr const char* kCardOfSecond = "989453230000000020F2";
 
 class ModemManager : public testing::Test {
  protected:
   void SetUp() override {
-    root.make_directory("/run/quorvel");
     if (::access(kDaemon, X_OK) != 0 || ::access(kManager, X_OK) != 0) {
       GTEST_SKIP() << "needs the packages dbus-daemon and modemmanager";
     }
-    modem.insert("989453230000000010F1", "262021234567890");
-    address = "unix:path=" + (root.outside() / "bus").string();
+    address = "unix:path=" + (older.root.outside() / "bus").string();
     ::setenv("DBUS_SYSTEM_BUS_ADDRESS", address.c_str(), 1);
     ::setenv("DBUS_SESSION_BUS_ADDRESS", address.c_str(), 1);
-    start_bus();
-    bridge.emplace(bridge_program());
-    ASSERT_TRUE(bridge->wait_until_ready());
-    observer.emplace(SocketPeer::connected_to("telvane.sock"));
-    ASSERT_EQ(observer->receive()->kind, wire::FrameKind::state);
+    modem.insert(kCardOfFirst, "262021234567890");
   }
 
   void TearDown() override {
-    if (HasFailure() && bridge) std::fputs(bridge->err().c_str(), stderr);
+    if (HasFailure() && older.service) std::fputs(older.service->err().c_str(), stderr);
   }
 
   void start_bus() {
-    std::filesystem::remove(root.outside() / "bus");
+    std::filesystem::remove(older.root.outside() / "bus");
     bus.emplace(
         kDaemon,
         ProgramOptions{.arguments = {"--session", "--nofork", "--print-address", "--address=" + address}, .input = {}});
@@ -49,6 +43,11 @@ class ModemManager : public testing::Test {
                                                  "--test-no-qrtr", "--test-no-suspend-resume"},
                                    .input = {}});
     ASSERT_TRUE(eventually([&] { return plug(modem.port()); }));
+  }
+
+  static void end(std::optional<Program>& program) {
+    program->send_signal(SIGKILL);
+    program->wait();
   }
 
   // Calls a method of ModemManager; false when it fails.
@@ -80,146 +79,132 @@ class ModemManager : public testing::Test {
     return done;
   }
 
-  // The next events must be `events`, by their initials, each with the state that is described as `state`.
-  void expect(const std::string& step, const std::string& events, const std::string& state) {
-    for (const char event : events) {
-      const auto frame = observer->receive(40s);
-      ASSERT_TRUE(frame) << step << ": no event came";
-      const char initial = frame->name == "sim-newly-inserted"     ? 'I'
-                           : frame->name == "sim-status-changed"   ? 'S'
-                           : frame->name == "phone-number-changed" ? 'N'
-                                                                   : 'P';
-      ASSERT_EQ(std::string(1, initial), std::string(1, event)) << step << ": " << described(frame->value);
-      std::string seen;
-      for (const char* name : {"sim-status", "iccid", "imsi"}) {
-        const PropertyValue& entry = frame->value.get(name);
-        seen += (seen.empty() ? "" : " ") + (entry.get("Code") ? "1." + described(entry.get("Code"))
-                                             : entry           ? described(entry.get("Value"))
-                                                               : "-");
-      }
-      EXPECT_EQ(seen, state) << step << ": " << described(frame->value);
-    }
+  void plug_again() { EXPECT_TRUE(plug(modem.port())); }
+  // Reports the card that is in the tray to ModemManager.
+  void swap(const char* iccid, const std::string& imsi) {
+    modem.insert(iccid, imsi);
+    modem.report_swap();
+  }
+  void lock() {
+    modem.answer("AT+CPIN?", "+CPIN: SIM PIN");
+    modem.answer("AT+CIMI", "+CME ERROR: 11");
   }
 
-  ScratchRoot root;
+  // How the bridge came to what it serves last.
+  [[nodiscard]] static bool has_told(const Device& device, const std::string& line, int times = 1) {
+    return eventually(
+        [&] {
+          const std::string log = device.service->err();
+          int count = 0;
+          for (std::size_t at = 0; (at = log.find(line, at)) != std::string::npos; ++at) ++count;
+          return count >= times;
+        },
+        40s);
+  }
+
+  Device newer{Device::Baseband::newer};
+  Device older{Device::Baseband::older};
   std::string address;
   FakeModem modem{"quorvel-" + std::to_string(::getpid())};
-  std::optional<Program> bus, manager, bridge;
-  std::optional<SocketPeer> observer;
+  std::optional<Program> bus, manager;
 };
 
-const std::string kFirst = "Ready 8949353200000000011 262021234567890";
-const std::string kSecond = "Ready 8949353200000000022 262029999999999";
-
-TEST_F(ModemManager, ACardComesIsSwappedIsLockedAndGoes) {
-  start_manager();
-  expect("ready", "SP", kFirst);
-  modem.insert("989453230000000020F2", "262029999999999");
-  modem.report_swap();
-  expect("swap", "ISP", kSecond);
-  modem.eject();
-  modem.report_swap();
-  expect("eject", "SP", "NotInserted  ");
-  modem.insert("989453230000000020F2", "262029999999999");
-  modem.answer("AT+CPIN?", "+CPIN: SIM PIN");
-  modem.answer("AT+CIMI", "+CME ERROR: 11");
-  modem.report_swap();
-  expect("locked", "ISP", "PinRequired 8949353200000000022 ");
-  EXPECT_FALSE(send_pin("4321"));
-  EXPECT_TRUE(send_pin("1234"));
-  expect("right PIN", "SP", kSecond);
-}
-
-TEST_F(ModemManager, AModemIsPluggedInAgainAndManagerAndBusAreLost) {
-  start_manager();
-  expect("ready", "SP", kFirst);
-  modem.answer("AT+CNUM", "+CNUM: \"\",\"+4915199999999\",145");
-  EXPECT_TRUE(plug(modem.port()));
-  expect("another number", "NP", kFirst);
-  modem.answer("AT+CRSM=176,12258,0,0,10", "+CME ERROR: 13");
-  modem.answer("AT+CIMI", "+CME ERROR: 13");
-  EXPECT_TRUE(plug(modem.port()));
-  expect("unreadable", "SP", "Ready 1.3 1.3");
-  manager->send_signal(SIGKILL);
-  manager->wait();
-  expect("ModemManager killed", "SP", "- 1.5 1.5");
-  modem.insert("989453230000000010F1", "262021234567890");
-  start_manager();
-  expect("ModemManager back", "SP", kFirst);
-  EXPECT_TRUE(plug("abstract:nobody"));
-  expect("unplugged", "SP", "- 1.1 1.1");
-  EXPECT_TRUE(plug(modem.port()));
-  expect("plugged in", "SP", kFirst);
-  bus->send_signal(SIGKILL);
-  bus->wait();
-  expect("bus lost", "SP", "- 1.6 1.6");
+// Each step is what happens to the modem and how many events tell of it; tests/bridge/life says what comes of them.
+TEST_F(ModemManager, DaemonsFollowALifeOfAModem) {
+  struct Turn {
+    const char* name;
+    std::size_t events;
+    std::function<void()> begin;
+  };
+  const Turn turns[] = {
+      {"a modem with a card", 2, [&] { start_manager(); }},
+      {"another card", 3, [&] { swap(kCardOfSecond, "262029999999999"); }},
+      {"no card", 2, [&] { modem.eject(), modem.report_swap(); }},
+      {"a locked card", 3, [&] { modem.insert(kCardOfSecond, ""), lock(), modem.report_swap(); }},
+      {"the wrong PIN", 0, [&] { EXPECT_FALSE(send_pin("4321")); }},
+      {"the right PIN", 2, [&] { EXPECT_TRUE(send_pin("1234")); }},
+      {"the same card, locked again", 2, [&] { lock(), plug_again(); }},
+      {"another locked card", 3, [&] { modem.insert(kCardOfFirst, ""), lock(), modem.report_swap(); }},
+      {"a card without a lock", 2, [&] { swap(kCardOfFirst, "262021234567890"); }},
+      {"another number", 2,
+       [&] {
+         modem.answer("AT+CNUM", "+CNUM: \"\",\"+4915199999999\",145");
+         plug_again();
+       }},
+      {"no number", 2, [&] { modem.answer("AT+CNUM", "ERROR"), plug_again(); }},
+      {"a card that cannot be read", 2,
+       [&] {
+         modem.answer("AT+CRSM=176,12258,0,0,10", "+CME ERROR: 13");
+         modem.answer("AT+CIMI", "+CME ERROR: 13");
+         plug_again();
+       }},
+      {"a card that can", 2, [&] { modem.insert(kCardOfFirst, "262021234567890"), plug_again(); }},
+      {"another firmware", 2, [&] { modem.answer("AT+CGMR", "FW 2.0"), plug_again(); }},
+      {"unplugged", 2, [&] { EXPECT_TRUE(plug("abstract:nobody")); }},
+      {"plugged in", 2, [&] { plug_again(); }},
+      {"ModemManager killed", 2, [&] { end(manager); }},
+      {"ModemManager back", 2, [&] { start_manager(); }},
+      {"the bus lost", 2, [&] { end(bus); }},
+      {"the bus back", 2, [&] { start_bus(); }},
+      {"ModemManager on the new bus", 2, [&] { start_manager(); }},
+  };
   start_bus();
-  expect("bus back", "SP", "- 1.5 1.5");
-  SocketPeer late = SocketPeer::connected_to("telvane.sock");
-  for (const char* name : {"", "sim-status-changed", "postponement-status-changed"}) {
-    EXPECT_EQ(late.receive()->name, name);
+  for (Device* device : {&older, &newer}) {
+    device->serve(bridge_program());
+    device->start_daemon();
+  }
+  const std::string recorded = older.root.outside() / "recording";
+  Program recorder(control_program(), {.arguments = {"sim", "record", recorded}, .input = {}});
+  ASSERT_TRUE(eventually([&] { return std::filesystem::exists(recorded) && steps_recorded(recorded).size() == 1; }));
+  const std::vector<Step> steps = written_life();
+  ASSERT_EQ(steps.size(), std::size(turns));
+  std::size_t events = 1;
+  for (std::size_t i = 0; i < std::size(turns); ++i) {
+    turns[i].begin();
+    events += turns[i].events;
+    ASSERT_TRUE(eventually([&] { return steps_recorded(recorded).size() >= events; }, 40s)) << turns[i].name;
+    const Step seen{turns[i].name, older.traces(steps[i].older), newer.traces(steps[i].newer)};
+    EXPECT_EQ(text_of(seen), text_of(steps[i]));
+  }
+  recorder.stop();
+  EXPECT_EQ(steps_recorded(recorded), steps_recorded(kRecording));
+
+  // A daemon and a bridge that start again under the other one: the facts are there, and nothing has changed.
+  older.daemon->stop();
+  older.start_daemon();
+  EXPECT_EQ(older.traces(steps.front().older).lines, steps.front().older.lines);
+  end(older.service);
+  older.serve(bridge_program());
+  EXPECT_TRUE(has_told(older, "for the first time: SIM status Ready"));
+  EXPECT_EQ(older.traces({{}, 1}), Traces({{}, 1}));
+  for (Device* device : {&older, &newer}) {
+    EXPECT_EQ(device->daemon->stop().status, 0);
+    device->root.ignore_log();
   }
 }
 
-TEST_F(ModemManager, TheCardDecidesBetweenTwoModems) {
+TEST_F(ModemManager, TheCardDecidesBetweenTwoModemsUnlessOneIsNamed) {
+  // The bridges are there before the bus is, and one of them waits for a modem that never comes.
+  older.serve(bridge_program());
+  newer.serve(bridge_program(), {"--device", "/virtual/third"});
+  start_bus();
   modem.eject();
   FakeModem other("quorvel-other-" + std::to_string(::getpid()));
-  other.insert("989453230000000020F2", "262029999999999");
+  other.insert(kCardOfSecond, "262029999999999");
   start_manager();
-  expect("no card", "SP", "NotInserted  ");
+  EXPECT_TRUE(has_told(older, "following the modem /virtual/first, the only one"));
+  EXPECT_TRUE(has_told(older, "for the first time: SIM status NotInserted"));
   EXPECT_TRUE(plug(other.port(), "second"));
-  expect("a card in the second", "ISP", kSecond);
-}
-
-// The daemon starts after everything was told, and collects all the same.
-TEST_F(ModemManager, ADaemonWithTheOldBasebandCollectsTheFacts) {
-  root.ignore_log();
-  start_manager();
-  expect("ready", "SP", kFirst);
-  Program daemon(daemon_program());
-  ASSERT_TRUE(daemon.wait_until_ready());
-  const std::string head = "lookup_baseband_info_old: ";
-  for (const char* line : {"We now have SIM status", "Inserting ICCID into the data ark",
-                           "Inserting IMSI into the data ark", "Inserting baseband version into the data ark"}) {
-    EXPECT_TRUE(root.wait_for_log(head + line)) << line;
-  }
-  modem.insert("989453230000000020F2", "262029999999999");
-  modem.report_swap();
-  EXPECT_TRUE(root.wait_for_log(head + "The ICCID has changed") && root.wait_for_log(head + "The IMSI has changed"));
-  modem.eject();
-  modem.report_swap();
-  EXPECT_TRUE(root.wait_for_log(head + "The ICCID has been removed"));
-  EXPECT_TRUE(root.wait_for_log(head + "The IMSI has been removed"));
-  EXPECT_EQ(daemon.stop().status, 0);
-}
-
-TEST_F(ModemManager, ADaemonWithTheNewBasebandCollectsTheRadioInfo) {
-  root.ignore_log();
-  root.write_file("/sys/firmware/devicetree/base/baseband/class", std::string_view("\2\0\0\0", 4));
-  start_manager();
-  Program daemon(daemon_program());
-  ASSERT_TRUE(daemon.wait_until_ready());
-  expect("ready", "SP", kFirst);
-  EXPECT_TRUE(root.wait_for_log("lookup_baseband_info_new: throwing some postponement into ark, radio status: Ready"));
-  EXPECT_TRUE(
-      root.wait_for_log("__lookup_baseband_info_new_block_invoke: got PhoneNumber = +4915112345678 from telvane"));
-  EXPECT_TRUE(plug("abstract:nobody"));
-  EXPECT_TRUE(root.wait_for_log("lookup_baseband_info_new: radio not ready: NotReady"));
-  EXPECT_EQ(daemon.stop().status, 0);
-}
-
-// Commands that change something are refused: the modem decides.
-TEST_F(ModemManager, IsShownButNotCommanded) {
-  for (const char* command : {"set", "fail", "notify"}) {
-    SocketPeer commander = SocketPeer::connected_to("telvane.sock");
-    commander.send(frame_bytes(wire::FrameKind::call, 1, command, dictionary({{"Field", "iccid"}})));
-    EXPECT_EQ(commander.receive()->kind, wire::FrameKind::state);
-    EXPECT_EQ(commander.receive()->value.get("Description").text(), "this telephony service follows a modem");
-  }
-  SocketPeer viewer = SocketPeer::connected_to("telvane.sock");
-  viewer.send(frame_bytes(wire::FrameKind::call, 1, "show"));
-  EXPECT_EQ(viewer.receive()->kind, wire::FrameKind::state);
-  EXPECT_EQ(viewer.receive()->kind, wire::FrameKind::reply);
+  EXPECT_TRUE(has_told(older, "following the modem /virtual/second, the best of "));
+  EXPECT_TRUE(has_told(older, "SIM status Ready, card ...0022, subscriber ...9999"));
+  // A card in the first changes nothing; the first is followed when the second is gone for good.
+  swap(kCardOfFirst, "262021234567890");
+  EXPECT_TRUE(plug("abstract:nobody", "second"));
+  EXPECT_TRUE(has_told(older, "waiting up to 10 s for the modem /virtual/second, which went away"));
+  EXPECT_TRUE(has_told(older, "following the modem /virtual/first, ", 2));
+  EXPECT_TRUE(has_told(older, "SIM status Ready, card ...0011, subscriber ...7890"));
+  EXPECT_TRUE(has_told(newer, "for the first time: no modem /virtual/third; there is /virtual/"));
+  for (Device* device : {&older, &newer}) EXPECT_EQ(device->service->stop().status, 0);
 }
 
 }  // namespace
