@@ -113,7 +113,7 @@ void add_facts(CLI::App& app, CommandLine& line) {
   CLI::App* command = add_command(
       app, {"facts", "Print what the device answers live, and from where",
             "  quorvelctl facts\n"
-            "  quorvelctl facts SerialNumber ProductType\n"
+            "  quorvelctl facts SerialNumber HardwareModel\n"
             "  quorvelctl facts --watch 5 BatteryCurrentCapacity\n"
             "  quorvelctl facts --json | jq -r '.[].key'",
             "Asks the device in this process, as the caller and outside the daemon's sandbox: the daemon may "

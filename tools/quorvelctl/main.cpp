@@ -10,7 +10,8 @@ namespace quorvel::tools {
 namespace {
 
 constexpr const char* kAbout =
-    "Values for people come as text; with --json, output is one JSON value (for monitor and log --follow one a line), "
+    "Values for people come as text; with --json, output is one JSON value (for monitor, log --follow and facts "
+    "--watch one a line), "
     "and plist write and sim set take it back. As JSON, data is {\"$data\": \"BASE64\"} and a date is {\"$date\": "
     "\"2026-01-31T12:00:00Z\"}. A real that is no number is {\"$real\": \"nan\"}, \"inf\" or \"-inf\". A dictionary "
     "whose only key looks like one of these has one more $ in front of that key.\n\n"

@@ -139,7 +139,7 @@ void add_root(CLI::App& app, CommandLine& line) {
   CLI::App* create = add_command(*root, {"create", "Make a device root; what is there already stays as it is",
                                          "  quorvelctl root create /tmp/device\n"
                                          "  export QUORVEL_ROOT=/tmp/device\n"
-                                         "  telvane-sim & quorveld & quorvelctl regulatory-images"});
+                                         "  telvane-sim & quorveld & quorvelctl log --follow"});
   auto directory = std::make_shared<std::string>();
   add_word(*create, "DIR", *directory, "The directory, made when it is missing")->required();
   create->callback([&line, directory] {
