@@ -1,5 +1,6 @@
 #include "linux/ipc/ipc_connection.h"
 
+#include <malloc.h>
 #include <sys/socket.h>
 #include <sys/uio.h>
 
@@ -15,6 +16,9 @@ namespace {
 
 // Room that a worker keeps for encoding replies.
 constexpr std::size_t kKeptReplyRoom = 128u << 10;
+
+// Behind a larger reply, memory that its value left free is given back to the system.
+constexpr std::size_t kLargeReply = 1u << 20;
 
 [[nodiscard]] const IpcOperation* find_operation(const IpcInterface* interface, std::string_view name) noexcept {
   if (interface == nullptr) return nullptr;
@@ -91,11 +95,15 @@ void IpcConnection::run_call(const wire::Frame& frame, host::IpcOutgoing& outgoi
     operation->invoke(object_, {argument, {peer_.user, peer_.process}}, answer);
   }
   outgoing_ = nullptr;
+  // The allocator keeps what a million small parts of a value took, because single ones among them are still in use.
+  if (std::exchange(outgoing.was_large, false)) ::malloc_trim(0);
 }
 
 void IpcConnection::reply(std::uint64_t serial, const PropertyValue& value, const IpcError* error) noexcept {
   outgoing_->frame.clear();
-  finish_reply(append_reply(serial, value, error, outgoing_->frame));
+  const bool complete = append_reply(serial, value, error, outgoing_->frame);
+  outgoing_->was_large = outgoing_->frame.size() > kLargeReply;
+  finish_reply(complete);
 }
 
 void IpcConnection::reply(std::uint64_t serial, const CheckedBytes& value) noexcept {

@@ -25,6 +25,7 @@ inline constexpr std::uint32_t kMaximumCallBody = 16u << 10;
 struct IpcOutgoing {
   ByteBuffer frame;
   wire::WaitingReplies* waiting = nullptr;
+  bool was_large = false;  // the reply that was encoded from a value
 };
 }  // namespace host
 

@@ -215,7 +215,8 @@ void IpcWorker::run_call(IpcConnection& connection) noexcept {
   // The next call is read once the client has taken this reply.
   if (!connection.input.keep()) return close(connection);
   note_held_input(connection);
-  stages_.move(connection, Stage::sending, now_);
+  // The calls of this round may have taken long, which is not the client's fault.
+  stages_.move(connection, Stage::sending, monotonic_milliseconds());
   set_interest(connection, EPOLLOUT);
   bound_held_input();
 }

@@ -86,8 +86,9 @@ void ignore_fatal_signals() noexcept {
   return EX_CONFIG;
 }
 
-// A large file or reply takes its memory back to the system with it. The allocator would otherwise learn from the first
-// one to keep such memory, in every thread.
+// A block of half a MiB or more is given back to the system when it is freed. The allocator would otherwise learn from
+// the first one to keep such blocks, in every thread. Values of many small blocks are another matter: the IPC service
+// has the allocator look for free pages behind a large one.
 void bound_idle_memory() noexcept {
   ::mallopt(M_MMAP_THRESHOLD, 512 << 10);
   ::mallopt(M_TRIM_THRESHOLD, 1 << 20);
