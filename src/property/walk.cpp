@@ -10,17 +10,7 @@ using namespace detail;
 
 namespace {
 
-// Puts a container into a set with room for it; false when it was there.
-bool insert(Word* set, std::size_t size, Word container) noexcept {
-  std::size_t at = static_cast<std::size_t>(mix(container, 0x9e3779b97f4a7c15)) & (size - 1);
-  for (; set[at] != 0; at = (at + 1) & (size - 1)) {
-    if (set[at] == container) return false;
-  }
-  set[at] = container;
-  return true;
-}
-
-// What a walk over a container comes to: the nodes of all its visits, and how many containers lie within each other.
+// The size of a walk over one container: the nodes of all visits, and how many containers lie within each other.
 struct Extent {
   Word container;  // 0 in a free slot
   std::uint64_t nodes;
@@ -107,44 +97,6 @@ bool Measure::add(const PropertyValue& container, std::size_t depth, Extent& aro
 }
 
 }  // namespace
-
-WalkBudget::~WalkBudget() {
-  if (seen_ != few_) std::free(seen_);
-}
-
-bool WalkBudget::grow() noexcept {
-  auto* larger = static_cast<Word*>(std::calloc(seen_size_ * 2, sizeof(Word)));
-  if (larger == nullptr) return false;
-  for (std::size_t i = 0; i < seen_size_; ++i) {
-    if (seen_[i] != 0) insert(larger, seen_size_ * 2, seen_[i]);
-  }
-  if (seen_ != few_) std::free(seen_);
-  seen_ = larger;
-  seen_size_ *= 2;
-  return true;
-}
-
-// True when the container is new. One that cannot be remembered counts as repeated: the bound then comes early.
-bool WalkBudget::remember(Word container) noexcept {
-  if (seen_count_ * 2 >= seen_size_ && !grow()) return false;
-  if (!insert(seen_, seen_size_, container)) return false;
-  ++seen_count_;
-  return true;
-}
-
-bool WalkBudget::enter(const PropertyValue& container) noexcept {
-  if (depth_ == kMaximumDepth) return false;
-  ++depth_;
-  const Word word = container.word();
-  if (repeated_depth_ > 0) {
-    ++repeated_depth_;
-  } else if (node_of(word)->count.load(std::memory_order_relaxed) > 1 && !remember(word)) {
-    repeated_depth_ = 1;
-  }
-  if (repeated_depth_ == 0) return true;
-  repeated_nodes_ += 1 + container.size() * (container.is_dictionary() ? 2 : 1);
-  return repeated_nodes_ <= kMaximumRepeatedNodes;
-}
 
 bool is_within_limits(const PropertyValue& value, std::size_t containers_around) noexcept {
   if (!value.is_container()) return true;
