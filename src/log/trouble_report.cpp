@@ -1,7 +1,5 @@
 #include "log/trouble_report.h"
 
-#include <string.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>

@@ -1,14 +1,15 @@
-// What the log writer itself cannot do: it cannot go to the log, so it goes to standard error.
+// Reports of the log writer's own failures. They cannot go to the log, so they go to standard error.
 #pragma once
 
 #include <cstddef>
 
 namespace quorvel {
 
-/// What one line met, written to standard error when this object ends, which is after the log lock has been given back.
+/// The failure that writing one line met. It is written to standard error when this object ends, which is after the log
+/// lock has been given back.
 class TroubleReport {
  public:
-  TroubleReport() noexcept {}  // leaves the text alone: hardly a line needs it
+  TroubleReport() noexcept = default;  // leaves the text alone: hardly a line needs it
   TroubleReport(const TroubleReport&) = delete;
   TroubleReport& operator=(const TroubleReport&) = delete;
   ~TroubleReport();

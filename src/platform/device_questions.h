@@ -121,7 +121,7 @@ static_assert(std::ranges::is_sorted(kDeviceQuestions, {}, &DeviceQuestion::name
 
 /// The place of a question in the table, or kDeviceQuestionCount.
 [[nodiscard]] constexpr std::size_t find_question_place(std::string_view name) noexcept {
-  const auto row = std::ranges::lower_bound(kDeviceQuestions, name, {}, &DeviceQuestion::name);
+  const auto* const row = std::ranges::lower_bound(kDeviceQuestions, name, {}, &DeviceQuestion::name);
   const auto place = static_cast<std::size_t>(row - std::begin(kDeviceQuestions));
   return place < kDeviceQuestionCount && row->name == name ? place : kDeviceQuestionCount;
 }
@@ -135,15 +135,12 @@ static_assert(std::ranges::is_sorted(kDeviceQuestions, {}, &DeviceQuestion::name
 /// The name of a question of the table above; one that is not in it does not compile.
 class QuestionName {
  public:
-  consteval QuestionName(std::string_view name)  // NOLINT(google-explicit-constructor): reads as the name it is
+  consteval QuestionName(std::string_view name)  // not explicit: reads as the name it is
       : place_(find_question_place(name)) {
     if (place_ == kDeviceQuestionCount) detail::refuse_to_compile("no question of the table has this name");
   }
-  consteval QuestionName(const char* name)  // NOLINT(google-explicit-constructor)
-      : QuestionName(std::string_view(name)) {}
-  constexpr operator std::string_view() const noexcept {
-    return kDeviceQuestions[place_].name;
-  }  // NOLINT(google-explicit-constructor)
+  consteval QuestionName(const char* name) : QuestionName(std::string_view(name)) {}
+  constexpr operator std::string_view() const noexcept { return kDeviceQuestions[place_].name; }
   /// The question's place in the table.
   [[nodiscard]] constexpr std::size_t index() const noexcept { return place_; }
 

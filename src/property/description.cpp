@@ -156,7 +156,7 @@ void describe_element(const PropertyValue& value, std::size_t depth, TextSink& s
 
 void TextSink::put(std::string_view text) noexcept {
   if (full_) return;
-  const std::size_t room = static_cast<std::size_t>(end_ - at_);
+  const auto room = static_cast<std::size_t>(end_ - at_);
   std::size_t count = std::min(room, text.size());
   if (count < text.size()) {
     // A cut falls between characters.

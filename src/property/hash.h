@@ -56,8 +56,7 @@ template <class T>
 /// A text together with its hash, so that a caller can hash once, and before it takes a lock.
 struct HashedKey {
   template <std::convertible_to<std::string_view> Text>
-  HashedKey(const Text& key) noexcept
-      : text(key), hash(detail::hash_text(text)) {}  // NOLINT(google-explicit-constructor)
+  HashedKey(const Text& key) noexcept : text(key), hash(detail::hash_text(text)) {}
   std::string_view text;
   std::uint32_t hash;
 };

@@ -130,7 +130,7 @@ class [[nodiscard]] PropertyValue {
 
  private:
   [[nodiscard]] std::optional<std::int64_t> wide_to_int64() const noexcept;
-  [[nodiscard]] bool make_unique(PropertyKind kind) noexcept;
+  [[nodiscard]] bool make_unique(PropertyKind wanted) noexcept;
 
   detail::Word word_ = 0;
 };
@@ -195,14 +195,14 @@ class DictionaryRange {
 template <std::size_t Size>
 class alignas(8) StaticText : detail::BytesNode {
  public:
-  consteval StaticText(const char (&text)[Size])  // NOLINT(google-explicit-constructor): reads as the text it is
+  consteval StaticText(const char (&text)[Size])  // not explicit: reads as the text it is
       : BytesNode{{0, PropertyKind::string, detail::kStatic | detail::kVerbatim, 0}, Size - 1} {
     for (std::size_t i = 0; i < Size; ++i) {
       if (static_cast<unsigned char>(text[i]) > 0x7f) detail::refuse_to_compile("a static text is ASCII");
       text_[i] = text[i];
     }
   }
-  operator PropertyValue() const noexcept {  // NOLINT(google-explicit-constructor): a name is a value
+  operator PropertyValue() const noexcept {  // not explicit: a name is a value
     return PropertyValue::adopt(detail::word_of(this));
   }
   [[nodiscard]] constexpr std::string_view text() const noexcept { return {text_, Size - 1}; }

@@ -105,7 +105,7 @@ std::optional<double> start_of(pid_t process) {
   if (!fields || ::clock_gettime(CLOCK_REALTIME, &now) != 0 || ::clock_gettime(CLOCK_BOOTTIME, &up) != 0) {
     return std::nullopt;
   }
-  const double ticks = static_cast<double>(std::strtoull(field.c_str(), nullptr, 10));
+  const auto ticks = static_cast<double>(std::strtoull(field.c_str(), nullptr, 10));
   const double boot = static_cast<double>(now.tv_sec - up.tv_sec) + static_cast<double>(now.tv_nsec - up.tv_nsec) / 1e9;
   return std::floor(boot + ticks / static_cast<double>(::sysconf(_SC_CLK_TCK)));
 }

@@ -97,7 +97,7 @@ void add_plist(CLI::App& app, CommandLine& line) {
 
   CLI::App* write =
       add_command(*plist, {"write", "Write a property-list file from the JSON on standard input",
-                           "  echo '[1, true, {\"$date\": \"2026-01-31T12:00:00Z\"}]' | quorvelctl plist write -"});
+                           R"(  echo '[1, true, {"$date": "2026-01-31T12:00:00Z"}]' | quorvelctl plist write -)"});
   add_word(*write, "FILE", *file, "The file, replaced as a whole; - is standard output")->required();
   write->callback([&line, file] {
     line.uses_root = false;

@@ -79,7 +79,7 @@ void RunLoop::run() noexcept {
 RunLoop* main_run_loop() noexcept {
   // Never destroyed: sources are served until the process is gone.
   alignas(RunLoop) static unsigned char storage[sizeof(RunLoop)];
-  static RunLoop* const loop = ::new (storage) RunLoop;
+  static auto* const loop = ::new (storage) RunLoop;
   return loop;
 }
 

@@ -1,5 +1,5 @@
-// The bones of a binary property list: its trailer, its offset table and where each object begins and ends. Everything
-// that reads one looks at its bytes through this, with every number checked before it is used.
+// The bones of a binary property list: its trailer, its offset table and where each object begins and ends. All
+// readers look at a file's bytes through this class, which checks every number before it is used.
 #pragma once
 
 #include <array>
@@ -83,7 +83,7 @@ class BinaryLayout {
   [[nodiscard]] std::uint64_t offset_at(const std::byte* at) const noexcept {
     return static_cast<std::uint64_t>(at - start_);
   }
-  /// Below this offset, what takes up to `size` bytes ends before the table.
+  /// Below this offset, an object of at most `size` bytes ends before the table.
   [[nodiscard]] std::uint64_t limit_of(std::size_t size) const noexcept {
     const std::uint64_t end = offset_at(table_);
     return end < size ? 0 : end - size;
@@ -113,9 +113,9 @@ class BinaryLayout {
   std::size_t unit_sizes_[5] = {0, 1, 2, 0, 0};  // by Marker::Unit, in bytes
 };
 
-// Done for containers and whatever else is no short leaf. Whether a size is long is hard to predict, so that the common
-// form of a long one, a single byte behind an integer's marker, is read without a branch; the two bytes behind the last
-// object can be read, because the trailer follows.
+// Called for containers and for leaves that are not short. A branch on whether a size is long would be mispredicted, so
+// the common form of a long one, a single byte behind an integer's marker, is read without one; the two bytes behind
+// the last object can be read, because the trailer follows.
 inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object) const noexcept {
   const std::byte* at = marker_at(offset);
   if (at == nullptr) return false;
@@ -125,6 +125,7 @@ inline bool BinaryLayout::object_at(std::uint64_t offset, EncodedObject& object)
   object.nibble = byte & 15;
   object.size = marker.is_long ? static_cast<std::uint64_t>(at[2]) : marker.size;
   object.body = at + (marker.is_long ? kLongHead : 1);
+  // NOLINTNEXTLINE(readability-implicit-bool-conversion): && would branch
   if ((marker.is_long & (at[1] != kOneByteInteger)) != 0 && !parse_long_size(object)) return false;
   // A size that would make the multiplication wrap exceeds the room, and is refused before it.
   const std::size_t unit = unit_sizes_[marker.unit];

@@ -59,20 +59,21 @@ class Reader {
 
  private:
   using Run = BlockRun<TakeReferences>;
-  struct Frame {
+  // A container whose elements are being made.
+  struct Visit {
     std::size_t object;
     std::uint64_t next;  // reference to look at
   };
 
-  bool objects_overlap() const noexcept;
+  [[nodiscard]] bool objects_overlap() const noexcept;
   // Notes an object that has, or will have, a count of its own; releases it when memory runs out.
-  bool note_counted(std::uint64_t number) noexcept;
+  [[nodiscard]] bool note_counted(std::uint64_t number) noexcept;
   void release_made(std::uint64_t number) const noexcept {
     if (made_[number].has_own_count()) release(made_[number].plain());
   }
 
   bool make_containers() noexcept;
-  bool visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept;
+  bool visit_children(Visit& visit, Visit* stack, std::size_t& depth) noexcept;
   bool make_container(const Object& object, MadeWord& made) noexcept;
   bool make_array(const Object& object, MadeWord& made) noexcept;
   bool make_dictionary(const Object& object, MadeWord& made) noexcept;
@@ -84,7 +85,8 @@ class Reader {
   }
   // The word of an object, with a reference to it.
   Word take(MadeWord made, Run& run) noexcept;
-  // Each container but the top one is made for its first reference: when there are more, a walk meets some again.
+  // Every container but the top one is made when its first reference is met. With more references than that, a walk
+  // meets some containers again.
   [[nodiscard]] bool shares_containers() const noexcept { return container_references_ + 1 > containers_; }
 
   std::span<const std::byte> bytes_;
@@ -156,15 +158,15 @@ inline Word Reader::take(MadeWord made, Run& run) noexcept {
 }
 
 // Puts the next child that must be made first on the stack; without one, makes the container on top of it.
-bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noexcept {
+bool Reader::visit_children(Visit& visit, Visit* stack, std::size_t& depth) noexcept {
   Object object;
-  if (!layout_.object_at(layout_.offset_of(frame.object), object)) return false;
+  if (!layout_.object_at(layout_.offset_of(visit.object), object)) return false;
   // Keys are texts, or refused when the dictionary is made: only its values can be containers.
   const std::uint64_t first = object.kind == format::kDictionary ? object.size : 0;
   const std::uint64_t references = first + object.size;
-  frame.next = std::max(frame.next, first);
-  for (; frame.next < references; ++frame.next) {
-    const std::byte* at = object.body + frame.next * layout_.reference_size();
+  visit.next = std::max(visit.next, first);
+  for (; visit.next < references; ++visit.next) {
+    const std::byte* at = object.body + visit.next * layout_.reference_size();
     const MadeWord made = made_at(at);
     if (made.bits == 0 || made == MadeWord::in_the_making()) return false;
     if (made == MadeWord::unmade()) {
@@ -175,12 +177,12 @@ bool Reader::visit_children(Frame& frame, Frame* stack, std::size_t& depth) noex
     }
   }
   --depth;
-  return make_container(object, made_[frame.object]);
+  return make_container(object, made_[visit.object]);
 }
 
 bool Reader::make_containers() noexcept {
   if (made_[layout_.top()] != MadeWord::unmade()) return true;
-  Frame stack[kMaximumDepth];
+  Visit stack[kMaximumDepth];
   std::size_t depth = 1;
   stack[0] = {static_cast<std::size_t>(layout_.top()), 0};
   made_[layout_.top()] = MadeWord::in_the_making();
@@ -220,7 +222,7 @@ bool Reader::make_dictionary(const Object& object, MadeWord& made) noexcept {
   return dictionary->used == dictionary->capacity;
 }
 
-// Takes the entries in use, all of them or those up to the first that is not sound.
+// Fills in the entries, up to the first that is not sound.
 void Reader::fill_dictionary(const Object& object, DictionaryNode& dictionary) noexcept {
   const BinaryLayout layout = layout_;
   const MadeWord* const made = made_;

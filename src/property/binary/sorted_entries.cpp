@@ -76,7 +76,7 @@ class Sorter {
     return tail;
   }
 
-  bool sort_tail(std::uint32_t* first, std::uint32_t* last) noexcept {
+  bool sort_tail(std::uint32_t* first, const std::uint32_t* last) noexcept {
     const auto count = static_cast<std::size_t>(last - first);
     std::size_t shared = key(*first).size();
     for (const std::uint32_t* at = first; at != last; ++at) {
