@@ -7,7 +7,7 @@
 //   %u %o %x %X   unsigned int; with l, ll or z: unsigned long, unsigned long long, std::size_t
 //   %p            const void*
 //   %c            char
-//   %@            PropertyValue, as its description (platform/property/description.h)
+//   %@            PropertyValue, as its description (property/description.h)
 //   %%            a percent sign
 //
 // with the flags - and 0, a width, and a precision for %s. Control characters in inserted texts are escaped: no value
@@ -28,7 +28,7 @@ namespace quorvel {
 /// without a lock.
 extern int extended_logging;
 
-/// One argument of a log line, referring to what it was made from.
+/// One argument of a log line. It refers to the value that it was made from, which must outlast it.
 class LogArgument {
  public:
   enum class Type : std::uint8_t { text, value, int_, long_, unsigned_int, unsigned_long, pointer, character };
@@ -80,12 +80,11 @@ consteval LogArgument::Type log_argument_type() {
     return Type::value;
 }
 
-/// The argument type that the conversion at `format[at]` (just behind its percent sign) asks for; moves `at` behind the
-/// conversion. False when there is no such conversion. `type` is left alone for %%, which asks for nothing.
+/// One conversion of a format, taken apart.
 struct Conversion {
   bool valid = false;
   bool takes_argument = false;
-  LogArgument::Type type = LogArgument::Type::text;
+  LogArgument::Type type = LogArgument::Type::text;  // of the argument, where it takes one
   char letter = 0;
   bool left = false;
   bool zero = false;
@@ -93,56 +92,75 @@ struct Conversion {
   int precision = -1;
 };
 
+/// A letter that ends a conversion, and the argument it asks for; `wide` is what l, ll or z before it make of that.
+struct ConversionLetter {
+  char letter;
+  LogArgument::Type type;
+  LogArgument::Type wide;  // the type itself: nothing of this kind may stand before the letter
+};
+inline constexpr ConversionLetter kConversionLetters[] = {
+    {'@', LogArgument::Type::value, LogArgument::Type::value},
+    {'s', LogArgument::Type::text, LogArgument::Type::text},
+    {'d', LogArgument::Type::int_, LogArgument::Type::long_},
+    {'i', LogArgument::Type::int_, LogArgument::Type::long_},
+    {'u', LogArgument::Type::unsigned_int, LogArgument::Type::unsigned_long},
+    {'o', LogArgument::Type::unsigned_int, LogArgument::Type::unsigned_long},
+    {'x', LogArgument::Type::unsigned_int, LogArgument::Type::unsigned_long},
+    {'X', LogArgument::Type::unsigned_int, LogArgument::Type::unsigned_long},
+    {'p', LogArgument::Type::pointer, LogArgument::Type::pointer},
+    {'c', LogArgument::Type::character, LogArgument::Type::character},
+};
+
+/// Moves `at` behind `byte` where it stands at `format[at]`, and tells whether it did.
+constexpr bool skip(std::string_view format, std::size_t& at, char byte) noexcept {
+  if (at >= format.size() || format[at] != byte) return false;
+  ++at;
+  return true;
+}
+
+/// The number in decimal digits at `format[at]`, 0 without a digit; moves `at` behind it. Five digits at most.
+constexpr int parse_number(std::string_view format, std::size_t& at) noexcept {
+  int number = 0;
+  for (; at < format.size() && format[at] >= '0' && format[at] <= '9' && number < 10'000; ++at) {
+    number = number * 10 + (format[at] - '0');
+  }
+  return number;
+}
+
+/// Takes the conversion apart whose percent sign stands right before `format[at]`; moves `at` behind it. The result is
+/// not valid when there is no such conversion.
 constexpr Conversion parse_conversion(std::string_view format, std::size_t& at) noexcept {
   Conversion result;
-  const auto peek = [&] { return at < format.size() ? format[at] : '\0'; };
-  const auto number = [&] {
-    int value = 0;
-    while (peek() >= '0' && peek() <= '9' && value < 10'000) value = value * 10 + (format[at++] - '0');
-    return value;
-  };
-  for (; peek() == '-' || peek() == '0'; ++at) (peek() == '-' ? result.left : result.zero) = true;
-  result.width = number();
-  if (peek() == '.') result.precision = (++at, number());
-  bool wide = false;
-  if (peek() == 'z')
-    wide = (++at, true);
-  else
-    for (int i = 0; i < 2 && peek() == 'l'; ++i) wide = (++at, true);
-  result.letter = peek();
+  for (;;) {
+    if (skip(format, at, '-')) {
+      result.left = true;
+    } else if (skip(format, at, '0')) {
+      result.zero = true;
+    } else {
+      break;
+    }
+  }
+  result.width = parse_number(format, at);
+  if (skip(format, at, '.')) result.precision = parse_number(format, at);
+  bool is_wide = skip(format, at, 'z');
+  if (!is_wide && skip(format, at, 'l')) {
+    is_wide = true;
+    skip(format, at, 'l');
+  }
+  result.letter = at < format.size() ? format[at] : '\0';
   ++at;
   result.takes_argument = result.letter != '%';
-  result.valid = true;
-  using Type = LogArgument::Type;
-  switch (result.letter) {
-    case 'd':
-    case 'i': result.type = wide ? Type::long_ : Type::int_; break;
-    case 'u':
-    case 'o':
-    case 'x':
-    case 'X': result.type = wide ? Type::unsigned_long : Type::unsigned_int; break;
-    case 's':
-      result.type = Type::text;
-      result.valid = !wide;
-      break;
-    case 'p':
-      result.type = Type::pointer;
-      result.valid = !wide;
-      break;
-    case 'c':
-      result.type = Type::character;
-      result.valid = !wide;
-      break;
-    case '@':
-      result.type = Type::value;
-      result.valid = !wide;
-      break;
-    case '%': break;
-    default: result.valid = false;
+  result.valid = !result.takes_argument;
+  for (const ConversionLetter& row : kConversionLetters) {
+    if (row.letter != result.letter) continue;
+    result.type = is_wide ? row.wide : row.type;
+    result.valid = !is_wide || row.wide != row.type;
+    break;
   }
   return result;
 }
 
+/// The format of a line, which does not compile unless its conversions fit the types of the arguments.
 template <class... Arguments>
 class CheckedFormat {
  public:
