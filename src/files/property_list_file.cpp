@@ -11,7 +11,6 @@
 #include "log/daemon_log.h"
 #include "platform/descriptor.h"
 #include "platform/file_system.h"
-#include "platform/flush_file.h"
 #include "platform/lock.h"
 #include "property/binary/binary.h"
 #include "property/binary/layout.h"

@@ -20,6 +20,7 @@ inline constexpr char kPreferencesDirectory[] = "/private/var/mobile/Library/Pre
 // The sockets of the daemon and of the telephony service, and what stands beside them.
 inline constexpr char kRunDirectory[] = "/run";
 inline constexpr char kServiceDirectory[] = "/run/quorvel";
+inline constexpr char kTelephonySocket[] = "/run/quorvel/telvane.sock";
 inline constexpr char kInstanceLock[] = "/run/quorvel/quorveld.lock";
 
 // Written by packaging, the distribution and the administrator.

@@ -29,7 +29,8 @@ inline constexpr std::size_t kPathSize = 1024;
 int remove_file(const char* path) noexcept;
 [[nodiscard]] int rename_file(const char* from, const char* to) noexcept;
 
-/// Brings a directory's entries to stable storage. Returns 0 or -1.
+/// Brings an open file's content, or a directory's entries, to stable storage. Each returns 0 or -1.
+[[nodiscard]] int flush_file(int descriptor) noexcept;
 [[nodiscard]] int flush_directory(const char* path) noexcept;
 
 }  // namespace quorvel::platform

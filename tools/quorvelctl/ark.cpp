@@ -103,10 +103,10 @@ int get_key(const ArkWords& words, const Form& form) {
   const LiveAnswer live = live_answer(words.domain, words.has_domain, words.key);
   if (live.row != nullptr) {
     if (live.value) return print_value(live.value, form);
-    return print_no_value("\"" + words.key +
-                              "\" is answered live, and this device does not know it. An administrator can give it in "
-                              "/etc/quorvel/device_information.plist",
-                          form.json);
+    return print_no_value(
+        "\"" + words.key + "\" is answered live, and this device does not know it. An administrator can give it in " +
+            paths::kDeviceInformation,
+        form.json);
   }
   const std::optional<PropertyValue> ark = read_saved_ark();
   const PropertyValue value = ark ? ark->get(words.domain + '-' + words.key) : PropertyValue();

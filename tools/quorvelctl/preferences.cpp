@@ -15,7 +15,6 @@
 #include "platform/descriptor.h"
 #include "platform/device_paths.h"
 #include "platform/file_system.h"
-#include "platform/flush_file.h"
 
 namespace quorvel::tools {
 namespace {

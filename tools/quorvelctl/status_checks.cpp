@@ -25,7 +25,6 @@ using namespace std::chrono_literals;
 constexpr double kEpoch = 978'307'200;  // 2001, in seconds since 1970
 constexpr auto kPatience = 2s;
 constexpr std::size_t kLongestLine = 64u << 10;
-constexpr const char* kSocket = "/run/quorvel/telvane.sock";
 
 std::string duration_text(double seconds) {
   const std::pair<double, const char*> units[] = {{86'400, "day"}, {3'600, "hour"}, {60, "minute"}, {1, "second"}};
@@ -56,8 +55,9 @@ bool is_foreign(const Server& service) { return service.state == Server::State::
 std::string why_not_followed(const Server& service, bool marked) {
   if (service.state == Server::State::absent) {
     struct stat socket {};
-    return exists(kSocket, &socket) ? std::string("nobody serves ") + kSocket + ", which is there"
-                                    : std::string("nothing is at ") + kSocket + ": the service does not run";
+    return exists(paths::kTelephonySocket, &socket)
+               ? std::string("nobody serves ") + paths::kTelephonySocket + ", which is there"
+               : std::string("nothing is at ") + paths::kTelephonySocket + ": the service does not run";
   }
   if (is_foreign(service))
     return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
@@ -116,7 +116,7 @@ Finding check_telephony(const Server& daemon) {
   Finding finding{"telephony", Verdict::well, {}, {}, PropertyValue::dictionary()};
   struct stat status {};
   const bool marked = exists(paths::kTelephonyMark, &status);
-  const bool expected = marked || exists(kSocket, &status);
+  const bool expected = marked || exists(paths::kTelephonySocket, &status);
   put(finding.facts, "expected", PropertyValue::boolean(expected));
   if (!expected) {
     finding.lines.push_back(std::string("none on this device: there is no ") + paths::kTelephonyMark);

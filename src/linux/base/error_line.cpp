@@ -44,32 +44,35 @@ class ErrorLine {
   std::size_t length_ = 0;
 };
 
+// Prints one line, with the text of the present error number behind it where that is asked for.
+[[gnu::format(printf, 2, 0)]] void print(bool with_error, const char* format, std::va_list arguments) noexcept {
+  const int error = errno;
+  ErrorLine line;
+  line.append_list(format, arguments);
+  if (with_error) {
+    char text[128];
+    line.append(": %s", ::strerror_r(error, text, sizeof text));
+  }
+  line.write();
+  errno = error;
+}
+
 }  // namespace
 
 void name_error_lines(const char* program) noexcept { program_name = program; }
 
 void print_error_line(const char* format, ...) noexcept {
-  const int error = errno;
-  ErrorLine line;
   std::va_list arguments;
   va_start(arguments, format);
-  line.append_list(format, arguments);
+  print(false, format, arguments);
   va_end(arguments);
-  line.write();
-  errno = error;
 }
 
 void print_system_error(const char* format, ...) noexcept {
-  const int error = errno;
-  ErrorLine line;
   std::va_list arguments;
   va_start(arguments, format);
-  line.append_list(format, arguments);
+  print(true, format, arguments);
   va_end(arguments);
-  char text[128];
-  line.append(": %s", ::strerror_r(error, text, sizeof text));
-  line.write();
-  errno = error;
 }
 
 }  // namespace quorvel::platform::host

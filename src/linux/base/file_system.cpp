@@ -9,7 +9,6 @@
 
 #include "linux/base/device_root.h"
 #include "platform/descriptor.h"
-#include "platform/flush_file.h"
 
 namespace quorvel::platform {
 
@@ -93,6 +92,10 @@ int rename_file(const char* from, const char* to) noexcept {
   if (!target) return -1;
   return uninterrupted(
       [&] { return ::renameat(source.directory(), source.name(), target.directory(), target.name()); });
+}
+
+int flush_file(int descriptor) noexcept {
+  return uninterrupted([=] { return ::fdatasync(descriptor); });
 }
 
 int flush_directory(const char* path) noexcept {

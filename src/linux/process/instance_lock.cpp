@@ -8,17 +8,15 @@
 
 #include "linux/base/error_line.h"
 #include "platform/descriptor.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 
 namespace quorvel::platform::host {
 
 namespace {
 
-constexpr char kServiceDirectory[] = "/run/quorvel";
-constexpr char kLockPath[] = "/run/quorvel/quorveld.lock";
-
 [[nodiscard]] bool make_service_directory() noexcept {
-  for (const char* path : {"/run", kServiceDirectory}) {
+  for (const char* path : {paths::kRunDirectory, paths::kServiceDirectory}) {
     if (make_directory(path, 0755) == 0 || errno == EEXIST) continue;
     print_system_error("cannot make the directory %s", path);
     return false;
@@ -29,17 +27,17 @@ constexpr char kLockPath[] = "/run/quorvel/quorveld.lock";
 // Files that root makes in another user's place keep that user's daemon from starting, and from logging.
 [[nodiscard]] bool would_lock_out_the_owner() noexcept {
   struct stat directory;
-  if (::geteuid() != 0 || file_status(kServiceDirectory, &directory) != 0 || directory.st_uid == 0) return false;
+  if (::geteuid() != 0 || file_status(paths::kServiceDirectory, &directory) != 0 || directory.st_uid == 0) return false;
   print_error_line(
       "%s belongs to user %u: run as that user, not as root; the installed service starts with: systemctl start "
       "quorveld",
-      kServiceDirectory, static_cast<unsigned>(directory.st_uid));
+      paths::kServiceDirectory, static_cast<unsigned>(directory.st_uid));
   return true;
 }
 
 // Nobody else may open the file: whoever can open it could hold the lock.
 [[nodiscard]] Descriptor open_lock_file() noexcept {
-  Descriptor file(open_file(kLockPath, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0600));
+  Descriptor file(open_file(paths::kInstanceLock, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0600));
   struct stat status;
   if (file && ::fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode)) return file;
   if (file) errno = EINVAL;
@@ -53,7 +51,7 @@ int take_instance_lock() noexcept {
   if (would_lock_out_the_owner()) return EX_NOPERM;
   Descriptor file = open_lock_file();
   if (!file) {
-    print_system_error("cannot open the lock file %s", kLockPath);
+    print_system_error("cannot open the lock file %s", paths::kInstanceLock);
     return EX_OSERR;
   }
   int result = ::flock(file.get(), LOCK_EX | LOCK_NB);
@@ -63,10 +61,10 @@ int take_instance_lock() noexcept {
     return 0;
   }
   if (errno == EWOULDBLOCK) {
-    print_error_line("another quorveld is running (it holds %s)", kLockPath);
+    print_error_line("another quorveld is running (it holds %s)", paths::kInstanceLock);
     return EX_UNAVAILABLE;
   }
-  print_system_error("cannot lock %s", kLockPath);
+  print_system_error("cannot lock %s", paths::kInstanceLock);
   return EX_OSERR;
 }
 

@@ -11,6 +11,7 @@
 #include "linux/base/error_line.h"
 #include "linux/base/local_socket.h"
 #include "linux/telephony/telephony_trouble.h"
+#include "platform/device_paths.h"
 #include "platform/file_system.h"
 #include "wire/service_path.h"
 #include "wire/telephony_state.h"
@@ -20,10 +21,6 @@ namespace quorvel::platform::host {
 namespace {
 
 constexpr std::size_t kReceiveSize = 64u << 10;
-
-constexpr char kPath[] = "/run/quorvel/telvane.sock";
-static_assert(std::string_view(kPath).starts_with(wire::kServiceDirectory) &&
-              std::string_view(kPath).ends_with(wire::kTelephonySocket));
 
 // How long an error lasts: until something changes in the service directory, or perhaps not so long.
 [[nodiscard]] TelephonyStream::Connection outcome_of(int error) noexcept {
@@ -36,13 +33,13 @@ static_assert(std::string_view(kPath).starts_with(wire::kServiceDirectory) &&
 void tell_unreachable(int error) noexcept {
   if (!should_tell(TelephonyTrouble::connection, error)) return;
   errno = error;
-  print_system_error("cannot connect to the telephony service on %s as user %u", kPath, ::geteuid());
+  print_system_error("cannot connect to the telephony service on %s as user %u", paths::kTelephonySocket, ::geteuid());
 }
 
 }  // namespace
 
 bool TelephonyStream::has_place() noexcept {
-  return static_cast<bool>(Descriptor(open_file(kPath, O_PATH | O_NOFOLLOW, 0)));
+  return static_cast<bool>(Descriptor(open_file(paths::kTelephonySocket, O_PATH | O_NOFOLLOW, 0)));
 }
 
 bool TelephonyStream::is_trusted(int directory, int socket) noexcept {
@@ -56,8 +53,8 @@ bool TelephonyStream::is_trusted(int directory, int socket) noexcept {
   user_ = peer.uid;
   if (peer.uid == 0 || peer.uid == status.st_uid) return true;
   if (should_tell(TelephonyTrouble::trust, static_cast<int>(peer.uid))) {
-    print_error_line("%s is served by process %d of user %u; only root and user %u, who owns %s, are believed", kPath,
-                     peer.pid, peer.uid, status.st_uid, wire::kServiceDirectory.data());
+    print_error_line("%s is served by process %d of user %u; only root and user %u, who owns %s, are believed",
+                     paths::kTelephonySocket, peer.pid, peer.uid, status.st_uid, wire::kServiceDirectory.data());
   }
   return false;
 }
@@ -84,8 +81,8 @@ void TelephonyStream::tell_unusable(const wire::Frame& frame) const noexcept {
                       : frame.payload.empty()
                           ? "no state"
                           : "a state that is no readable property list with a dictionary at its root";
-  print_error_line("the telephony service on %s (process %d, user %u) sent %s: frame of kind %u, %zu bytes", kPath,
-                   process_, user_, fault, kind, frame.payload.size());
+  print_error_line("the telephony service on %s (process %d, user %u) sent %s: frame of kind %u, %zu bytes",
+                   paths::kTelephonySocket, process_, user_, fault, kind, frame.payload.size());
 }
 
 void TelephonyStream::close() noexcept {
@@ -106,11 +103,11 @@ TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept
     case wire::FrameResult::incomplete: return Result::nothing;
     case wire::FrameResult::refused: break;
   }
-  if (should_tell(TelephonyTrouble::frame, frame.head.kind > wire::FrameKind::event)) {
+  if (should_tell(TelephonyTrouble::frame, frame.head.kind > wire::FrameKind::event ? 1 : 0)) {
     print_error_line(
         "the telephony service on %s (process %d, user %u) sent no frame: kind %u, flags %u, name of %u bytes, body of "
         "%u bytes (at most %u)",
-        kPath, process_, user_, static_cast<unsigned>(frame.head.kind), unsigned{frame.head.flags},
+        paths::kTelephonySocket, process_, user_, static_cast<unsigned>(frame.head.kind), unsigned{frame.head.flags},
         unsigned{frame.head.name_length}, frame.head.body_length, wire::kMaximumStateBody);
   }
   return Result::gone;
@@ -126,8 +123,8 @@ TelephonyStream::Result TelephonyStream::receive() noexcept {
   if (count > 0) return Result::frame;
   if (count < 0 && (error == EAGAIN || error == EINTR)) return Result::nothing;
   if (should_tell(TelephonyTrouble::loss, count == 0 ? 0 : error)) {
-    print_error_line("the telephony service on %s (process %d, user %u) left%s%s", kPath, process_, user_,
-                     count == 0 ? "" : ": ", count == 0 ? "" : ::strerrordesc_np(error));
+    print_error_line("the telephony service on %s (process %d, user %u) left%s%s", paths::kTelephonySocket, process_,
+                     user_, count == 0 ? "" : ": ", count == 0 ? "" : ::strerrordesc_np(error));
   }
   return Result::gone;
 }
