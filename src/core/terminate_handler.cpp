@@ -1,5 +1,5 @@
-// Nothing in the daemon throws. The standard library's own handler for what is thrown nevertheless would print the name
-// of its type, for which it brings 60 KiB of code that undoes the mangling of names.
+// Nothing in the daemon throws. For an exception that appears nevertheless, the standard library's own handler would
+// print the name of the type, and bring 60 KiB of code that undoes the mangling of names.
 
 #include <cstdlib>
 

@@ -23,7 +23,7 @@ void lookup_baseband_info_old(DataArk* ark) noexcept;
 /// an error.
 [[nodiscard]] PropertyValue copyPostponementStuff(PropertyValue* status) noexcept;
 
-/// Given to every telephony server connection. Nothing is expected to arrive here; what does is logged.
+/// Given to every telephony server connection. Nothing is expected to arrive here; an arrival is logged.
 void _telvaneserver_callback(void* context) noexcept;
 
 }  // namespace quorvel

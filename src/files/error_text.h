@@ -6,8 +6,8 @@
 
 namespace quorvel {
 
-/// Takes errno when it is made and sets it again when it ends, so that the callers of whoever met an error can still
-/// tell it. The text is borrowed and lasts as long as this object. Any thread.
+/// Takes errno when it is made and sets it again when it ends, so that a caller further up still
+/// finds it there. The text is borrowed and lasts as long as this object. Any thread.
 class ErrorText {
  public:
   ErrorText() noexcept : number_(errno), text_(::strerror_r(number_, buffer_, sizeof buffer_)) {}

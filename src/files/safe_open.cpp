@@ -130,10 +130,11 @@ bool has_type(const Descriptor& file, const char* path, mode_t expected_type) no
   return false;
 }
 
-// What the caller's flags asked of the open and what had to wait for the checks. A failure is a failed open.
+// Does the part of the open that had to wait for the checks: the caller's own flags, and the truncation. A failure is
+// logged as a failed open.
 bool finish_open(const Descriptor& file, const char* path, int flags, mode_t type) noexcept {
   int result = 0;
-  // Of the flags given here only those count that can change after an open.
+  // F_SETFL ignores the flags that cannot change after an open.
   if ((flags & O_NONBLOCK) == 0) result = ::fcntl(file.get(), F_SETFL, flags);
   if (result == 0 && (flags & O_TRUNC) != 0 && type == kRegularFile) {
     do {

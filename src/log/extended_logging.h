@@ -2,8 +2,8 @@
 
 namespace quorvel {
 
-/// Settles `extended_logging`: on for an internal release type, or where the preference "ExtLogging" holds an integer,
-/// whichever; off otherwise. Start-up, once, before any other thread runs.
+/// Settles `extended_logging`: on for an internal release type, and where the preference "ExtLogging" holds an integer,
+/// whatever its value; off otherwise. Start-up, once, before any other thread runs.
 void setup_extended_logging() noexcept;
 
 }  // namespace quorvel

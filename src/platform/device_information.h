@@ -12,7 +12,7 @@ struct DeviceAnswer {
   PropertyValue origin;  ///< a text: the device path or the source that the value came from
 };
 
-/// The answer to a question with its origin, or two times none. Asks anew each time. Any thread.
+/// The answer to a question with its origin, both none when nobody knows. Asks anew each time. Any thread.
 [[nodiscard]] DeviceAnswer copy_device_answer_with_origin(std::string_view question) noexcept;
 
 /// The answer alone.

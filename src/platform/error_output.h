@@ -1,4 +1,4 @@
-// Standard error: a courtesy that nobody ever waits for.
+// Standard error, which nobody ever waits for.
 #pragma once
 
 #include <string_view>

@@ -16,7 +16,7 @@ class CheckedBytes;
 
 namespace quorvel::platform {
 
-/// What went wrong with a call, as its client is told.
+/// The error that a reply carries.
 struct IpcError {
   std::int32_t code;
   std::string_view description;
@@ -30,13 +30,14 @@ inline constexpr std::int32_t kRefusedArgument = 2;
 class IpcConnection;
 class IpcListener;
 
-/// Who makes a call: the user and the process that connected, as the kernel knew them then. A user of -1 is not known.
+/// The caller of an operation: the user and the process that connected, as the kernel knew them then. A user of -1 is
+/// not known.
 struct IpcCaller {
   uid_t user = static_cast<uid_t>(-1);
   pid_t process = 0;
 };
 
-/// The client's way to be answered, for as long as the operation runs: it can neither be kept nor be handed on, so that
+/// The reply to a call. It lasts as long as the operation runs and can neither be kept nor be handed on, so that
 /// nothing can be sent to a connection that is gone by then. Empty when the client wants no reply. A call that the
 /// operation does not answer stays unanswered.
 class IpcReply {
@@ -46,10 +47,10 @@ class IpcReply {
   IpcReply(const IpcReply&) = delete;
   IpcReply& operator=(const IpcReply&) = delete;
   [[nodiscard]] explicit operator bool() const noexcept { return connection_ != nullptr; }
-  /// Sends a value (or none) and an error (or null); further calls do nothing. A reply that memory does not suffice
-  /// for closes the connection. On the thread that runs the operation.
+  /// Sends a value (or none) and an error (or null); further calls do nothing. The connection is closed
+  /// when memory runs out. On the thread that runs the operation.
   void send(const PropertyValue& value, const IpcError* error) noexcept;
-  /// The same for a value that is there as its checked bytes.
+  /// The same for a value whose checked bytes are at hand.
   void send(const CheckedBytes& value) noexcept;
 
  private:
@@ -57,7 +58,7 @@ class IpcReply {
   std::uint64_t serial_;
 };
 
-/// What an operation is given beside the exported object.
+/// The call that an operation answers.
 struct IpcCall {
   const PropertyValue& argument;  ///< none when the call has none
   IpcCaller caller;
@@ -74,7 +75,7 @@ struct IpcInterface {
   std::span<const IpcOperation> operations;
 };
 
-/// What a delegate does with a connection it accepts. The connection belongs to the service.
+/// For the delegate, to be called for a connection that it accepts. The connection belongs to the service.
 void set_exported_interface(IpcConnection* connection, const IpcInterface* interface) noexcept;
 void set_exported_object(IpcConnection* connection, void* object) noexcept;
 void resume(IpcConnection* connection) noexcept;

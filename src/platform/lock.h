@@ -3,7 +3,7 @@
 //   store lock          one per data ark; may take the notification center's lock and the log lock
 //   large-load lock     loads of property-list files above 64 MiB; may take the log lock
 //   notification lock   the notification center's ring; takes nothing
-//   IPC locks           the host layer's own; take nothing, never held while a request runs
+//   IPC locks           hand-over, shares and waiting replies: take nothing, held for a moment
 //   telephony lock      the last state that the telephony service pushed; takes nothing
 //   left-out-lines lock the lines that clients caused of late; takes nothing
 //   log lock            innermost: nothing is taken while it is held
@@ -33,9 +33,9 @@ namespace quorvel {
 /// A non-recursive mutual-exclusion lock, ready without a set-up call.
 ///
 /// What it guards is mostly held for less than it takes to sleep and wake up, or even to pass the lock from one
-/// processor to another. So who finds it taken stays away from it for some microseconds, looks again, a few times at
-/// growing intervals, and then sleeps: threads that are after one lock get through many operations each before they
-/// take turns.
+/// processor to another. So a thread that finds it taken stays away from it for some microseconds, looks again, a few
+/// times at growing intervals, and then sleeps: threads that are after one lock get through many operations each before
+/// they take turns.
 class QUORVEL_THREAD_ANNOTATION(capability("mutex")) Lock {
  public:
   constexpr Lock() noexcept = default;

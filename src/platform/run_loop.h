@@ -7,9 +7,9 @@ class RunLoop;
 
 enum class RunLoopMode { default_mode };
 
-/// The calling thread's run loop, null where it has none; the main thread's run loop. Borrowed, live for ever. The
-/// current run loop is asked for by the main thread only.
+/// The calling thread's run loop: the main run loop on the main thread, null on any other. Borrowed, lives for ever.
 [[nodiscard]] RunLoop* current_run_loop() noexcept;
+/// The main thread's run loop. Borrowed, lives for ever. Any thread.
 [[nodiscard]] RunLoop* main_run_loop() noexcept;
 
 /// Serves the main run loop's sources until SIGTERM or SIGINT ends it. Main thread, once.

@@ -28,7 +28,8 @@ class BlockRun {
 
   /// Gathers a reference to a leaf that lies in a block. Only a leaf of another block than the last one's is looked at.
   void add(const Node* leaf) noexcept { add_masked(leaf, ~Word{0}); }
-  /// The same where `mask` has all bits set, and nothing, without a branch, where it has none.
+  /// The same where `mask` has all bits set; adds nothing where it has none. The mask is not branched on: without bits
+  /// it makes the distance 0, which lies inside every block, since `size_` is never 0.
   void add_masked(const Node* leaf, Word mask) noexcept {
     if (((word_of(leaf) - reinterpret_cast<Word>(block_)) & mask) >= size_) move_to(leaf);
     references_ += mask & 1;

@@ -94,7 +94,7 @@ std::uint32_t find_slot(const DictionaryNode& dictionary, const HashedKey& key) 
   return dictionary.index_size;
 }
 
-// Empties a slot and moves back what was pushed behind it.
+// Empties a slot, and moves the slots back that stand behind it only because it was taken.
 void clear_slot(DictionaryNode& dictionary, std::uint32_t at) noexcept {
   const std::uint32_t mask = dictionary.index_size - 1;
   for (std::uint32_t next = (at + 1) & mask; dictionary.index[next].entry != 0; next = (next + 1) & mask) {

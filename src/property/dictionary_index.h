@@ -13,7 +13,7 @@ namespace quorvel::detail {
 /// Up to this many entries are found by scanning, without an index.
 inline constexpr std::uint32_t kUnindexed = 8;
 
-/// The slots that so many entries need.
+/// How many slots the index of `entries` entries has.
 [[nodiscard]] inline std::uint32_t index_size_for(std::uint32_t entries) noexcept {
   return std::bit_ceil(entries + entries / 3 + 1);
 }
@@ -27,7 +27,7 @@ inline void place(IndexSlot* index, std::uint32_t mask, IndexSlot slot) noexcept
   index[at] = slot;
 }
 
-/// Makes the index of an empty dictionary that is about to get so many entries. False when memory runs out.
+/// Makes the index of an empty dictionary that is about to get `entries` entries. False when memory runs out.
 [[nodiscard]] bool make_index(DictionaryNode& dictionary, std::uint32_t entries) noexcept;
 
 /// Puts the entries of a dictionary that is being filled into the index that `make_index` made, in their order. The
@@ -40,8 +40,8 @@ class IndexFiller {
   IndexFiller& operator=(const IndexFiller&) = delete;
   ~IndexFiller() { place_all(); }
 
-  /// Adds the entry behind those that are in use, whose key is `text`. With `check`, false when one of those has it,
-  /// too.
+  /// Adds the entry behind those that are in use, whose key is `text`. With `check`, false when an
+  /// entry in use has the same key.
   [[nodiscard]] bool add(std::string_view text, bool check) noexcept {
     // Without an index, only a search needs the hash.
     if (index_ == nullptr) return !check || find_entry(dictionary_, text) == nullptr;

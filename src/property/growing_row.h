@@ -21,8 +21,8 @@ class GrowingRow {
   [[nodiscard]] T& operator[](std::size_t index) noexcept { return items_[index]; }
   [[nodiscard]] const T& operator[](std::size_t index) const noexcept { return items_[index]; }
 
-  /// Makes room for so many items in all, at least those that are there. False, and nothing changed, when memory runs
-  /// out.
+  /// Makes room for `room` items in all, which must be no fewer than there are. False, and nothing changed, when memory
+  /// runs out.
   [[nodiscard]] bool reserve(std::size_t room) noexcept {
     void* grown = std::realloc(items_, room * sizeof(T));
     if (grown == nullptr) return false;
@@ -36,7 +36,7 @@ class GrowingRow {
     items_[size_++] = item;
     return true;
   }
-  /// For a caller that filled in items behind the last by itself: there are `size` in all, within the room.
+  /// To be called when items behind the last have been filled in by hand: there are `size` in all now, within the room.
   void set_size(std::size_t size) noexcept { size_ = size; }
 
  private:

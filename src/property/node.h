@@ -48,8 +48,8 @@ struct BytesNode : Node {
   [[nodiscard]] char* bytes() noexcept { return reinterpret_cast<char*>(this) + kBytesOffset; }
   [[nodiscard]] std::string_view view() const noexcept { return {bytes(), length}; }
   static constexpr std::size_t kBytesOffset = 12;
-  /// The memory for so many bytes. The first sixteen can always be read and written, so that a short text needs no copy
-  /// byte by byte.
+  /// The memory for a leaf of `length` bytes. The first sixteen can always be read and written, so that a short text
+  /// needs no copy byte by byte.
   [[nodiscard]] static constexpr std::size_t allocation(std::size_t length) noexcept {
     return kBytesOffset + (length < 20 ? 20 : length);
   }
@@ -79,7 +79,7 @@ struct Entry {
   Word value;
 };
 
-// One slot of a dictionary's index: the upper half of the key's hash, and the entry's position plus one (0: free).
+// One slot of a dictionary's index: the key's hash, and the entry's position plus one (0: free).
 struct IndexSlot {
   std::uint32_t hash;
   std::uint32_t entry;

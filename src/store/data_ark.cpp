@@ -34,7 +34,7 @@ bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, Marks& marks
   return false;
 }
 
-// A save puts every value into one dictionary: what fits no bound there would take all the others along.
+// A save puts every value into one dictionary: one that breaks a limit there would keep all others from being saved.
 bool can_be_saved(const PropertyValue& value) noexcept { return !value.is_container() || is_within_limits(value, 1); }
 
 void post_set_events(const DataArk& ark, const StoreKey& key, bool changed) noexcept QUORVEL_REQUIRES(ark.lock) {

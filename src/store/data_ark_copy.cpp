@@ -22,7 +22,7 @@ PropertyValue copy_live_answer(const larry_info& row) noexcept {
   return answer;
 }
 
-// What store keys begin with. Domains share their beginning with each other, so the end is compared first.
+// The beginning of the store keys of one domain. Many domains begin alike, so the end of it is compared first.
 class Prefix {
  public:
   explicit Prefix(std::string_view text) noexcept : text_(text), end_(end_of(text)) {}

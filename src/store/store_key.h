@@ -21,7 +21,7 @@ class StoreKey {
   [[nodiscard]] explicit operator bool() const noexcept { return text_ != nullptr; }
   [[nodiscard]] const HashedKey& hashed() const noexcept { return hashed_; }
   [[nodiscard]] std::string_view text() const noexcept { return hashed_.text; }
-  /// The domain store key: what stands up to and with the hyphen behind the domain.
+  /// The store key of the domain itself: the text up to the hyphen behind the domain, the hyphen included.
   [[nodiscard]] std::string_view domain_text() const noexcept { return text().substr(0, domain_length_); }
   [[nodiscard]] bool has_key() const noexcept { return has_key_; }
 

@@ -10,8 +10,7 @@
 
 namespace quorvel::detail {
 
-// In ascending order of their keys, entries lie anywhere in memory: what is needed so many entries later is fetched
-// meanwhile.
+// Entries in ascending order of their keys lie scattered in memory: each is fetched while this many before it are put.
 inline constexpr std::size_t kFetchAhead = 16;
 
 inline void fetch(Word word) noexcept {

@@ -1,5 +1,5 @@
-// Where a reader's leaves lie: side by side in blocks that each share one count, so that reading and releasing a file
-// costs no allocation for each value. A value that outlives the rest of its file keeps its block alive: at most
+// The memory of a reader's leaves: side by side in blocks that each share one count, so that reading and releasing a
+// file costs no allocation for each value. A value that outlives the rest of its file keeps its block alive: at most
 // `kBlockSize` bytes; a leaf larger than `kLargestShared` has memory and a count of its own.
 #pragma once
 
@@ -33,7 +33,7 @@ class LeafAllocator {
     const char* block;
   };
   [[nodiscard]] Room room() const noexcept { return {at_, end_, reinterpret_cast<const char*>(newest_)}; }
-  /// Takes back what `room` gave, with leaves up to `room.at`.
+  /// Takes the free part back from that caller; leaves lie in it up to `room.at`.
   void fill(const Room& room) noexcept { at_ = room.at; }
 
   /// A leaf whose bytes the caller fills in, or null. A leaf of its own memory comes with one reference; a leaf in a

@@ -16,8 +16,9 @@ inline constexpr std::ptrdiff_t kShortLeafRoom = kShortShapes[kShortText].room;
 static_assert(kShortText <= LeafAllocator::kLargestShared, "a short leaf lies in a block");
 static_assert(kShortLeafRoom + sizeof(Block) <= LeafAllocator::kBlockSize, "an empty block has room for one");
 
-/// Makes a short leaf in a block with at least `kShortLeafRoom`, and moves `room` behind it. `all` becomes its chunks
-/// together, which tell whether a text is sound. A leaf that a word holds leaves the room to the next one.
+/// Makes a short leaf in a block with at least `kShortLeafRoom`, and moves `room` behind it. `all` becomes its chunks,
+/// joined by OR, which tell whether a text is sound. A leaf that a word holds takes no room: the next one overwrites
+/// it.
 inline MadeWord make_short_leaf(const ShortLeaf& leaf, LeafAllocator::Room& room, Chunk& all) noexcept {
   const LeafMarker& marker = leaf.marker;
   const auto distance = static_cast<std::uint32_t>((room.at - room.block) / 8);

@@ -1,4 +1,4 @@
-// What stands for an object while its file is read.
+// The word that stands for an object while its file is read.
 #pragma once
 
 #include "property/node.h"

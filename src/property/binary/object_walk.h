@@ -1,15 +1,14 @@
-// The one walk over a file's objects, in the order of their numbers. It knows which objects are sound; its sink says
-// what becomes of them, and is made for it alone, so that all of it is compiled into one loop.
+// The one walk over a file's objects, in the order of their numbers. The walk knows which objects are sound; a sink
+// decides what becomes of them. Each sink is a template argument, so that walk and sink are compiled into one loop.
 //
 // A sink has
 //
-//   begin_run()           what takes a run of short leaves: a small object that the loop keeps in registers, with
+//   begin_run()           makes a run, which takes short leaves: a small object that the loop keeps in registers, with
 //                           has_room()           whether it can take one more
 //                           take(number, leaf)   takes a leaf, and returns all its chunks together
 //   end_run(run)          takes the run back
-//   accept_disorder()     asked once, at the first object that does not stand behind the one before it: whether the
-//   walk
-//                         may go on
+//   accept_disorder()     tells whether the walk may go on at the first object that does not stand behind the one
+//                         before it; asked once
 //   add_leaf(number, object, length), add_container(number, object)
 //                         takes any other object, which is sound; `length` is that of the leaf's bytes in memory
 //

@@ -11,7 +11,7 @@
 
 namespace quorvel::detail {
 
-/// What the marker of a short leaf says of it. Masks have all bits set or none.
+/// The facts that a marker tells about a short leaf. Masks have all bits set or none.
 struct alignas(8) LeafMarker {
   std::uint8_t size;       // in bytes, unless it is long; above `kShortText` for every other object
   std::uint8_t long_mask;  // whether the size stands in an integer object behind the marker

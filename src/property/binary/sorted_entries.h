@@ -13,8 +13,7 @@ namespace quorvel::detail {
 class SortedEntries {
  public:
   /// Tests false when memory runs out. The dictionary, which keeps the order it was found to have, may not change or
-  /// end meanwhile. The entries in `omitted`, where it is given, are left out. Any
-  /// thread.
+  /// end meanwhile. The entries in `omitted`, where it is given, are left out. Any thread.
   explicit SortedEntries(const DictionaryNode& dictionary, const OmittedEntries* omitted = nullptr) noexcept;
   SortedEntries(const SortedEntries&) = delete;
   SortedEntries& operator=(const SortedEntries&) = delete;
@@ -22,8 +21,9 @@ class SortedEntries {
 
   [[nodiscard]] explicit operator bool() const noexcept { return valid_; }
   [[nodiscard]] std::size_t size() const noexcept { return size_; }
-  /// The row that the entries lie in, and their places there; no places where they stand in order and without gaps.
+  /// The row that the entries lie in.
   [[nodiscard]] const Entry* entries() const noexcept { return entries_; }
+  /// The places of the entries in the row, in order; null where the row itself is in order and without gaps.
   [[nodiscard]] const std::uint32_t* order() const noexcept { return order_; }
 
  private:
