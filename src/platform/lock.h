@@ -4,6 +4,7 @@
 //   large-load lock     loads of property-list files above 64 MiB; may take the log lock
 //   notification lock   the notification center's ring; takes nothing
 //   IPC locks           hand-over, shares and waiting replies: take nothing, held for a moment
+//   zone lock           the C library's time zone; takes nothing
 //   telephony lock      the last state that the telephony service pushed; takes nothing
 //   left-out-lines lock the lines that clients caused of late; takes nothing
 //   log lock            innermost: nothing is taken while it is held
