@@ -16,6 +16,7 @@ int change_container(quorvel_value** handle, PropertyKind kind, Change change) n
   PropertyValue container = take_over(*handle);
   PropertyValue changed = container.is_mutable() ? std::move(container) : container.mutable_copy();
   const bool done = changed && change(changed);
+  // NOLINTNEXTLINE(bugprone-use-after-move): a value that was moved from is none
   *handle = hand_out(done || !container ? std::move(changed) : std::move(container));
   return done ? QUORVEL_OK : QUORVEL_SYSTEM_FAILURE;
 }

@@ -5,7 +5,9 @@
 
 namespace __gnu_cxx {
 
+// NOLINTBEGIN(bugprone-reserved-identifier): the name is that of the function it replaces
 void __verbose_terminate_handler();
 void __verbose_terminate_handler() { std::abort(); }
+// NOLINTEND(bugprone-reserved-identifier)
 
 }  // namespace __gnu_cxx

@@ -58,8 +58,9 @@ bool LogFiles::open() {
     Descriptor newest = open_log(paths::kLogFile);
     const Descriptor again = open_log(paths::kPreviousLogFile);
     if (static_cast<bool>(previous) != static_cast<bool>(again) || (previous && !same_file(previous, again))) continue;
-    following_ = previous ? std::move(newest) : Descriptor();
-    current_ = {previous ? std::move(previous) : std::move(newest), 0, {}};
+    if (!previous) std::swap(previous, newest);
+    current_ = {std::move(previous), 0, {}};
+    following_ = std::move(newest);
     return static_cast<bool>(current_.file);
   }
 }

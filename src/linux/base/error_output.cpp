@@ -22,7 +22,7 @@ void write_without_waiting(std::string_view text) noexcept {
     pollfd output{STDERR_FILENO, POLLOUT, 0};
     if (::poll(&output, 1, 0) != 1 || (output.revents & POLLOUT) == 0) return;
   }
-  static_cast<void>(!::write(STDERR_FILENO, text.data(), text.size()));
+  [[maybe_unused]] const ssize_t written = ::write(STDERR_FILENO, text.data(), text.size());
 }
 
 }  // namespace

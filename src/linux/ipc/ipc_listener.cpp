@@ -91,7 +91,7 @@ void IpcListener::ask_others_for_room(const host::IpcWorker& worker) noexcept {
 }
 
 IpcListener* create_listener(std::string_view service_name) noexcept {
-  IpcListener* listener = new (std::nothrow) IpcListener;
+  auto* listener = new (std::nothrow) IpcListener;
   if (listener != nullptr && listener->set_service_name(service_name)) return listener;
   delete listener;
   return nullptr;

@@ -14,7 +14,7 @@ namespace host {
 NotificationServer& notification_server() noexcept {
   // Never destroyed: other threads may post until the process is gone.
   alignas(NotificationServer) static unsigned char storage[sizeof(NotificationServer)];
-  static NotificationServer* const server = ::new (storage) NotificationServer;
+  static auto* const server = ::new (storage) NotificationServer;
   return *server;
 }
 

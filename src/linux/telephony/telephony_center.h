@@ -31,11 +31,11 @@ class TelephonyCenter {
     Observer* next;
   };
 
-  static void serve_stream(void* center) noexcept;
-  static void try_again(void* center) noexcept;
+  static void serve_stream(void* context) noexcept;
+  static void try_again(void* context) noexcept;
   [[nodiscard]] bool handle(const wire::Frame& frame) noexcept;
   void deliver(std::string_view name) noexcept;
-  static void serve_directory(void* center) noexcept;
+  static void serve_directory(void* context) noexcept;
   void watch_directory() noexcept;
   void look_for_service() noexcept;
   void watch_stream() noexcept;
