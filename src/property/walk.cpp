@@ -96,10 +96,25 @@ bool Measure::add(const PropertyValue& container, std::size_t depth, Extent& aro
   return depth + extent.height - 1 <= kMaximumDepth;
 }
 
+bool holds_a_container(const PropertyValue& value) noexcept {
+  if (value.is_dictionary()) {
+    for (const auto& [key, element] : value.entries()) {
+      if (element.is_container()) return true;
+    }
+    return false;
+  }
+  for (std::size_t i = 0; i < value.size(); ++i) {
+    if (value.at(i).is_container()) return true;
+  }
+  return false;
+}
+
 }  // namespace
 
 bool is_within_limits(const PropertyValue& value, std::size_t containers_around) noexcept {
   if (!value.is_container()) return true;
+  // Most containers that are stored hold leaves alone: those repeat nothing, and need no measure set up.
+  if (!holds_a_container(value)) return containers_around < kMaximumDepth;
   Measure measure;
   Extent whole = {};
   return measure.add(value, 1 + containers_around, whole) && whole.nodes - measure.distinct() <= kMaximumRepeatedNodes;

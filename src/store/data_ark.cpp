@@ -8,15 +8,16 @@ namespace quorvel {
 
 namespace {
 
-// What the class marks say about a store key: the key's text as they hold it, and the classes it is in.
+// What the class marks say about a store key: the key's text as they hold it, none when they do not, and the classes it
+// is in. Good until the marks change.
 struct Marks {
-  PropertyValue key;
+  const PropertyValue* key = nullptr;
   unsigned classes = 0;
 };
 
 Marks marks_of(const DataArk& ark, const HashedKey& key) noexcept QUORVEL_REQUIRES(ark.lock) {
   const DictionaryEntry entry = ark.class_marks.find(key);
-  return {entry.key, DataArk::classes_in(entry.value)};
+  return {&entry.key, DataArk::classes_in(entry.value)};
 }
 
 // Adds an entry that is not there; its key joins the classes of its domain, which `marks` then tells as well. A key
@@ -29,7 +30,7 @@ bool insert(DataArk& ark, const StoreKey& key, PropertyValue value, Marks& marks
     if (!ark.add_to_classes(key.hashed(), joined)) return false;
     marks = marks_of(ark, key.hashed());
   }
-  if (ark.values.add(key.hashed(), marks.key, std::move(value))) return true;
+  if (ark.values.add(key.hashed(), *marks.key, std::move(value))) return true;
   if (joined != 0) ark.remove_from_classes(key.hashed(), joined);
   return false;
 }
