@@ -287,7 +287,7 @@ void ModemManagerSource::finish_reading() {
   is_reading_ = false;
   retry_delay_ = std::chrono::seconds(1);
   if (is_stale_) return;
-  if (!said_.empty()) trouble_ = "ModemManager can be asked again";
+  if (!said_.empty()) trouble_ = reading_.reach == Reach::running ? "ModemManager answers" : "the bus answers";
   said_.clear();
   last_reach_ = reading_.reach;
   complete_ = std::move(reading_);

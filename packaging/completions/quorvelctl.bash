@@ -1,4 +1,4 @@
-# bash completion for quorvelctl and telvane-sim: the program itself says what can stand next.
+# bash completion for quorvelctl, telvane-sim and quorvel-modem-bridge: the program itself says what can stand next.
 
 _quorvelctl() {
   local program=${COMP_WORDS[0]} line current word i
@@ -34,4 +34,4 @@ _quorvelctl() {
   done < <("$program" __complete "${words[@]}" 2>/dev/null)
 }
 
-complete -F _quorvelctl quorvelctl telvane-sim
+complete -F _quorvelctl quorvelctl telvane-sim quorvel-modem-bridge
