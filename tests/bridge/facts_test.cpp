@@ -189,6 +189,10 @@ TEST(Facts, FollowsThePinnedDeviceAndHidesIdentities) {
             std::vector<std::string>({"following the modem b, as --device says",
                                       "told sim-status-changed, postponement-status-changed for the first time: SIM "
                                       "status Ready, card ...9353, subscriber ...2021"}));
+  EXPECT_TRUE(Facts({}, true)
+                  .take(of({ready("8949353", "262021")}), {})
+                  .lines.back()
+                  .ends_with(", card 8949353, subscriber 262021"));
   EXPECT_EQ(described(telling.state.get("postponement").get("Value")),
             R"({"Status": "Ready", "IntegratedCircuitCardIdentity": "8949353", )"
             R"("InternationalMobileSubscriberIdentity": "262021", "InternationalMobileEquipmentIdentity": "", )"
