@@ -26,7 +26,7 @@ class NotificationRing {
   /// The newest sequence number, 0 when there is none. Any thread.
   [[nodiscard]] std::uint64_t newest() noexcept;
 
-  /// The step of a reader at `position` towards `end`, which has been newest. Any thread.
+  /// What a reader at `position` meets next, up to and with `end`, a number that `newest` has given. Any thread.
   [[nodiscard]] Step step(std::uint64_t position, std::uint64_t end) noexcept;
 
   /// Lets go of everything up to and with `position`, which no reader needs any more. Any thread.

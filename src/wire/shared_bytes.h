@@ -27,8 +27,8 @@ class SharedBytes {
     if (block_ != nullptr && block_->count.fetch_sub(1, std::memory_order_acq_rel) == 1) delete block_;
   }
 
-  /// Takes over the content of `bytes`; empty, and `bytes` as it was, when memory runs out. Room that the content does
-  /// not need is given back or, where that is the smaller part, kept.
+  /// Takes over the content of `bytes`; empty, and `bytes` as it was, when memory runs out. Unused room is
+  /// given back where it is more than half of the whole.
   [[nodiscard]] static SharedBytes take(ByteBuffer& bytes) noexcept {
     SharedBytes result;
     result.block_ = new (std::nothrow) Block;

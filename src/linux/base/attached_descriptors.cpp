@@ -135,9 +135,9 @@ void prepare_to_receive(int connection) noexcept {
   static_cast<void>(::setsockopt(connection, SOL_SOCKET, SO_OOBINLINE, &kYes, sizeof kYes));
 }
 
-// What is looked at stays where it is, with what is attached to it. The kernel tells that by saying that there was no
-// room for it. It looks no further than to the end of the first message with attachments, and receives no more than the
-// bytes that were looked at.
+// Looking at bytes (MSG_PEEK) leaves them where they are, with whatever is attached to them. Of attached descriptors
+// the kernel says that there was no room to pass them on. A look ends behind the first message that has any, so the
+// bytes of a look without any are free of them, and no more than those are received.
 ssize_t receive_bytes(int connection, std::span<std::byte> room) noexcept {
   if (closing_thread.is_running()) {
     iovec part = {room.data(), room.size()};

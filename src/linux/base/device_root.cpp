@@ -54,7 +54,7 @@ void read_prefix(DeviceRoot& root) noexcept {
     return root;
   }
   read_prefix(root);
-  // Said once and in time, not at each path.
+  // A kernel without openat2 is noticed here, at the start, and not at each path.
   const int found = try_open(root, "/", O_PATH | O_CLOEXEC, 0);
   if (found < 0 && errno == ENOSYS) root.error = ENOSYS;
   if (found >= 0) ::close(found);

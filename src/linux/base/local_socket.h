@@ -41,7 +41,7 @@ class ListeningSocket {
 
   /// Listens on `name` in the service directory. The file has `mode` and the directory's owner, as far as this process
   /// may give it away, before anybody can connect; one that was left behind by a dead process is replaced. Empty with
-  /// errno set: EADDRINUSE when a live process holds it, EEXIST when what stands there is no socket.
+  /// errno set: EADDRINUSE when a live process holds it, EEXIST when something other than a socket stands there.
   [[nodiscard]] static ListeningSocket open(std::string_view name, mode_t mode = 0666) noexcept;
 
   [[nodiscard]] explicit operator bool() const noexcept { return static_cast<bool>(socket_); }

@@ -1,4 +1,5 @@
-// Files that provisioning and the kernel keep for the daemon, read whole. What is no regular file is never waited for.
+// Files that provisioning and the kernel keep for the daemon, read whole. Anything but a regular
+// file is refused, and never waited for.
 #pragma once
 
 #include <fcntl.h>

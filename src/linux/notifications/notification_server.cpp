@@ -78,9 +78,9 @@ void NotificationServer::handle(const epoll_event& event) noexcept {
   forget_served();
 }
 
-// Whoever was connected before a notification was posted receives it. So the newest number is read first: everybody
-// who was connected before one of the numbers up to it is then accepted here or was accepted before, and starts from
-// the number of the round before.
+// An observer that connected before a notification was posted receives it. The newest number is therefore read before
+// the waiting observers are accepted: each of them starts behind the number of the round before, and so misses none of
+// the notifications up to the newest.
 void NotificationServer::serve_news() noexcept {
   queue_.silence();
   woken_.store(false);

@@ -29,7 +29,7 @@ namespace {
 constexpr rlim_t kMaximumDescriptors = 65536;
 constexpr rlim_t kFewestDescriptors = 40;
 
-// A file that took the number of a closed standard descriptor would receive what is meant for that.
+// A file that took the number of a closed standard descriptor would receive what is written to it.
 [[nodiscard]] bool fill_standard_descriptors() noexcept {
   int descriptor = -1;
   do {

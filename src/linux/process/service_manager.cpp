@@ -26,7 +26,7 @@ namespace {
 constexpr int kFirstPassedDescriptor = 3;
 constexpr int kMaximumPassedDescriptors = 1024;
 
-// What an environment variable holds; none without it, and where it holds no number.
+// The number that an environment variable's value is; none for a variable that is not set or holds something else.
 [[nodiscard]] std::optional<int> number_in(const char* value) noexcept {
   if (value == nullptr) return std::nullopt;
   const char* end = value + std::strlen(value);
@@ -45,7 +45,7 @@ constexpr int kMaximumPassedDescriptors = 1024;
 // The passed descriptor that clients are accepted from, or -1. Settled before the daemon opens anything of its own.
 constinit int passed_socket = -1;
 
-// How many of the passed descriptors are of which use.
+// Sorts the passed descriptors by what they can be used for.
 struct Passed {
   int missing = 0;     // not open at all
   int foreign = 0;     // no local stream socket

@@ -97,7 +97,7 @@ void TelephonyCenter::look_for_service() noexcept {
       return schedule_try();
     case host::TelephonyStream::Connection::barred:
       say("Listening; the telephony service cannot be followed: standard error says why");
-      // The refusal may have been the moment's. One that lasts ends with a change in the directory, which is watched.
+      // The refusal may pass within a moment. A lasting one ends with a change in the directory, which is watched.
       if (delay_ < kLongestDelay) return schedule_try();
       break;
     case host::TelephonyStream::Connection::absent: say("Listening; waiting for the telephony service"); break;
@@ -132,7 +132,7 @@ void TelephonyCenter::serve_stream(void* context) noexcept {
   center.stream_source_.has_more = true;
 }
 
-// False for what the service cannot have meant to send, and when memory runs out.
+// False for a frame that the service cannot have meant to send, and when memory runs out.
 bool TelephonyCenter::handle(const wire::Frame& frame) noexcept {
   PropertyValue state = wire::state_of(frame);
   if (!state) {
@@ -162,7 +162,7 @@ void TelephonyCenter::lose_service() noexcept {
   schedule_try();
 }
 
-// What the service manager shows; told when it changes.
+// The service manager is sent the status that it shows whenever that changes.
 void TelephonyCenter::say(const char* status) noexcept {
   if (status != status_) host::report_status(status);
   status_ = status;

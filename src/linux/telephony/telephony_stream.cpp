@@ -22,7 +22,7 @@ namespace {
 
 constexpr std::size_t kReceiveSize = 64u << 10;
 
-// How long an error lasts: until something changes in the service directory, or perhaps not so long.
+// How long a failure to connect lasts: until something changes in the service directory, or perhaps not so long.
 [[nodiscard]] TelephonyStream::Connection outcome_of(int error) noexcept {
   using Connection = TelephonyStream::Connection;
   if (error == ENOENT) return Connection::absent;
