@@ -8,6 +8,7 @@
 #include <sys/socket.h>
 #include <sys/syscall.h>
 #include <sys/uio.h>
+#include <sys/un.h>
 #include <sys/wait.h>
 
 #include "linux/base/local_socket.h"
@@ -67,6 +68,24 @@ Descriptor lingering_socket() {
   return writer;
 }
 
+// Returns how many messages were sent.
+std::size_t send_attached(int socket, std::string bytes, const Descriptor& attachment) {
+  iovec part = {bytes.data(), bytes.size()};
+  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
+  msghdr message = {};
+  message.msg_iov = &part;
+  message.msg_iovlen = 1;
+  message.msg_control = control;
+  message.msg_controllen = sizeof control;
+  cmsghdr* const attached = CMSG_FIRSTHDR(&message);
+  attached->cmsg_level = SOL_SOCKET;
+  attached->cmsg_type = SCM_RIGHTS;
+  attached->cmsg_len = CMSG_LEN(sizeof(int));
+  const int number = attachment.get();
+  std::memcpy(CMSG_DATA(attached), &number, sizeof number);
+  return ::sendmsg(socket, &message, MSG_DONTWAIT | MSG_NOSIGNAL) > 0 ? 1 : 0;
+}
+
 void PrintTo(const Attack& attack, std::ostream* out) { *out << attack.name; }
 
 // A process of the other user that holds as many connections as it can get, and opens those anew that are closed.
@@ -105,7 +124,7 @@ class OtherUser {
         if (!open) {
           socket = platform::host::connect_local(service);
           if (socket) send(socket, attack.first);
-          if (socket && attack.attaches) *held_ += send_attached(socket, attack.always, lingering_socket());
+          if (socket && attack.attaches) *held_ += send_attached(socket.get(), attack.always, lingering_socket());
         } else {
           send(socket, attack.always);
         }
@@ -127,23 +146,6 @@ class OtherUser {
       while (socket && ::recv(socket.get(), replies, sizeof replies, MSG_DONTWAIT) > 0) continue;
     }
     ::usleep(5'000);
-  }
-
-  static std::size_t send_attached(const Descriptor& socket, std::string bytes, const Descriptor& attachment) {
-    iovec part = {bytes.data(), bytes.size()};
-    alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
-    msghdr message = {};
-    message.msg_iov = &part;
-    message.msg_iovlen = 1;
-    message.msg_control = control;
-    message.msg_controllen = sizeof control;
-    cmsghdr* const attached = CMSG_FIRSTHDR(&message);
-    attached->cmsg_level = SOL_SOCKET;
-    attached->cmsg_type = SCM_RIGHTS;
-    attached->cmsg_len = CMSG_LEN(sizeof(int));
-    const int number = attachment.get();
-    std::memcpy(CMSG_DATA(attached), &number, sizeof number);
-    return ::sendmsg(socket.get(), &message, MSG_DONTWAIT | MSG_NOSIGNAL) > 0 ? 1 : 0;
   }
 
   std::atomic<std::size_t>* held_;  // connections, or how often something was attached
@@ -229,6 +231,33 @@ TEST_F(OtherUserTest, PushesNoLineOutOfTheLog) {
   const Latencies latencies = latencies_of(std::move(waits));
   tell_figure("another user, calls that log: good calls", "each within 1 s", written(latencies),
               latencies.worst <= 1000 || kInstrumented);
+}
+
+// The service manager listens before the daemon starts: nothing refuses what is attached then.
+TEST(PassedSocket, HoldsUpNobodyWithWhatWasAttachedBefore) {
+  ScratchRoot root;
+  root.ignore_log();
+  root.make_directory("/run/quorvel");
+  constexpr const char* kService = "com.Orvane.quorveld.sock";
+  sockaddr_un address = {AF_UNIX, {}};
+  root.path(std::string("/run/quorvel/") + kService).string().copy(address.sun_path, sizeof address.sun_path - 1);
+  const Descriptor passed(::socket(AF_UNIX, SOCK_STREAM, 0));
+  ASSERT_EQ(::bind(passed.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+  ASSERT_EQ(::listen(passed.get(), 16), 0);
+  std::vector<SocketPeer> hostile;
+  for (int i = 0; i < 6; ++i) {
+    hostile.push_back(SocketPeer::connected_to(kService));
+    ASSERT_EQ(send_attached(hostile.back().descriptor(), calls(1), lingering_socket()), 1u);
+  }
+  Program daemon("/bin/bash", {.arguments = {"-c", "exec 3<&" + std::to_string(passed.get()) +
+                                                       "; LISTEN_FDS=1 LISTEN_PID=$$ exec " + daemon_program()},
+                               .input = {}});
+  ASSERT_TRUE(daemon.wait_until_ready());
+  for (SocketPeer& peer : hostile) EXPECT_TRUE(peer.is_closed());
+  SocketPeer good = SocketPeer::connected_to(kService);
+  ASSERT_TRUE(good.send(image_call(1)));
+  EXPECT_TRUE(good.receive());
+  EXPECT_EQ(daemon.stop().status, 0);
 }
 
 INSTANTIATE_TEST_SUITE_P(other_user, OtherUserTest, testing::ValuesIn(kAttacks), testing::PrintToStringParamName());

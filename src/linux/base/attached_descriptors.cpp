@@ -112,6 +112,16 @@ void ClosingThread::close(Descriptor connection) noexcept {
   }
 }
 
+[[nodiscard]] bool refuse(int socket) noexcept {
+  constexpr int kNone = 0;
+  return ::setsockopt(socket, SOL_SOCKET, kPassRights, &kNone, sizeof kNone) == 0;
+}
+
+void keep_away() noexcept {
+  if (closing_thread.is_running() || closing_thread.start()) return;
+  print_system_error("cannot start the thread that closes what peers attach to their messages");
+}
+
 [[nodiscard]] bool has_attached_descriptors(const msghdr& message) noexcept {
   return (message.msg_flags & MSG_CTRUNC) != 0;
 }
@@ -120,17 +130,22 @@ void ClosingThread::close(Descriptor connection) noexcept {
 
 void refuse_attached_descriptors(int listener) noexcept {
   const int error = errno;
-  constexpr int kNone = 0;
-  if (::setsockopt(listener, SOL_SOCKET, kPassRights, &kNone, sizeof kNone) != 0 && !closing_thread.is_running() &&
-      !closing_thread.start()) {
-    print_system_error("cannot start the thread that closes what peers attach to their messages");
-  }
+  if (!refuse(listener)) keep_away();
   errno = error;
 }
 
-// A byte that is out of band would be dropped, with what is attached to it, when the bytes around it are received.
+void refuse_further_descriptors(int listener) noexcept {
+  const int error = errno;
+  static_cast<void>(refuse(listener));
+  keep_away();
+  errno = error;
+}
+
+// A connection that is older than the refusal on its listener knows nothing of it. A byte that is out of band would be
+// dropped, with what is attached to it, when the bytes around it are received.
 void prepare_to_receive(int connection) noexcept {
   if (!closing_thread.is_running()) return;
+  static_cast<void>(refuse(connection));
   constexpr int kYes = 1;
   static_cast<void>(::setsockopt(connection, SOL_SOCKET, SO_OOBINLINE, &kYes, sizeof kYes));
 }

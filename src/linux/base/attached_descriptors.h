@@ -2,9 +2,9 @@
 // that receives or drops the message, and closing one can take as long as its owner wishes: hours, for a socket that
 // lingers.
 //
-// Linux 6.16 and later refuse them when asked to. On an older kernel no thread that serves receives or drops a message
-// with any: it looks at what has come before it takes it, and leaves every closing to a thread of its own, in which the
-// kernel waits for nobody's socket.
+// Linux 6.16 and later refuse them when asked to. Where that is too late or the kernel older, no thread that serves
+// receives or drops a message with any: it looks at what has come before it takes it, and leaves every closing to a
+// thread of its own, in which the kernel waits for nobody's socket.
 #pragma once
 
 #include <sys/types.h>
@@ -19,6 +19,8 @@ namespace quorvel::platform::host {
 /// Has the kernel refuse attached descriptors on the listening socket `listener` and on what is accepted from it or,
 /// where it cannot, has this process keep away from them from now on. Main thread.
 void refuse_attached_descriptors(int listener) noexcept;
+/// The same for a socket that has listened before, to which clients may have connected and attached some already.
+void refuse_further_descriptors(int listener) noexcept;
 
 /// Makes a connection that was just accepted ready for `receive_bytes`.
 void prepare_to_receive(int connection) noexcept;

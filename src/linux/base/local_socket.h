@@ -30,7 +30,7 @@ class ListeningSocket {
   ListeningSocket() noexcept = default;
   /// Takes over a listening socket from elsewhere; its file stays.
   explicit ListeningSocket(Descriptor socket) noexcept : socket_(std::move(socket)) {
-    refuse_attached_descriptors(socket_.get());
+    refuse_further_descriptors(socket_.get());
   }
   ListeningSocket(ListeningSocket&& other) noexcept { *this = std::move(other); }
   ListeningSocket& operator=(ListeningSocket&& other) noexcept;
