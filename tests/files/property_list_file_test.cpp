@@ -1,6 +1,8 @@
 #include "files/property_list_file.h"
 
+#include <fcntl.h>
 #include <sys/resource.h>
+#include <sys/stat.h>
 
 #include <fstream>
 
@@ -107,6 +109,23 @@ TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
   EXPECT_FALSE(load_mutable_dict(kFile.c_str()));
   root.expect_log({"_load_dict: too big for our purposes"});
   EXPECT_EQ(descriptors_open(), open_before);
+}
+
+TEST_F(PropertyListFile, AFileThatChangesMeanwhileIsReadOnceMore) {
+  // Reading it takes long enough for a change to fall into.
+  const PropertyValue large = test::data(std::string(16u << 20, 'x'));
+  root.write_plist(kFile, large);
+  std::atomic<bool> done = false;
+  std::thread toucher([&] {
+    const std::string path = root.path(kFile);
+    for (time_t time = 0; !done; ++time) {
+      const timespec times[] = {{time, 0}, {time, 0}};
+      ::utimensat(AT_FDCWD, path.c_str(), times, 0);
+    }
+  });
+  for (int i = 0; i < 20; ++i) EXPECT_TRUE(load_dict(kFile.c_str()) == large);
+  done = true;
+  toucher.join();
 }
 
 TEST_F(PropertyListFile, AStoreThatFailsSaysWhyAndHarmsNothing) {
