@@ -5,6 +5,12 @@ target_compile_options(quorvel_options INTERFACE -Wall -Wextra -Wpedantic -Wconv
 if(CMAKE_CXX_COMPILER_ID MATCHES "Clang")
   target_compile_options(quorvel_options INTERFACE -Wthread-safety)
 endif()
+# Ordinary code as well, for what is linked without optimising across files.
+set(across_files OFF)
+if(CMAKE_INTERPROCEDURAL_OPTIMIZATION AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
+  set(across_files ON)
+  target_compile_options(quorvel_options INTERFACE -ffat-lto-objects)
+endif()
 if(QUORVEL_SANITIZE)
   target_compile_options(quorvel_options INTERFACE -fsanitize=${QUORVEL_SANITIZE} -fno-omit-frame-pointer
                                                    -fno-sanitize-recover=all)
