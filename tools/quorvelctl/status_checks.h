@@ -20,6 +20,12 @@ struct Finding {
   PropertyValue facts;             // for programs, a dictionary
 };
 
+/// Dates count from 2001, the kernel from 1970.
+inline constexpr double kSecondsTo2001 = 978'307'200;
+
+/// "DATE, N hours ago".
+[[nodiscard]] std::string since_text(double date);
+
 [[nodiscard]] Finding check_daemon(const Server& daemon);
 /// Calls the daemon, which has a service manager start one that does not run.
 [[nodiscard]] Finding check_calls();
