@@ -289,20 +289,26 @@ const std::string kOne("\1\0\0\0", 4), kFpga = detection("This is an FPGA, fakin
 const std::string kWide =
     "getDeviceTreeInt: value for class property of IODeviceTree:/baseband is invalid (<02000000 02000000 8 bytes>)";
 
-const Device kDevices[] = {{"Phone", {}, kPhone, kTwo, true, found("Ondrel9,2", true, 2)},
-                           {"OldBaseband", {}, kPhone, kOne, false, found("Ondrel9,2", true, 1)},
-                           {"NegativeClass", {}, kPhone, "\xfe\xff\xff\xff", false, found("Ondrel9,2", true, -2)},
-                           {"NothingKnown", {}, {}, "", false, after(kNoClass, found("(null)", false, -1))},
-                           {"NoProductType", {}, kUnnamed, kTwo, true, found("(null)", true, 2)},
-                           {"AnswersOfOtherKinds", {}, kOdd, kTwo, true, found("(null)", false, 2)},
-                           {"WideClass", {}, kPhone, kTwo + kTwo, false, after(kWide, found("Ondrel9,2", true, -1))},
-                           {"Board", {}, kBoard, kTwo, false, overridden({kFpga})},
-                           {"HackMachine", text("Q35"), kPhone, kTwo, false, overridden({})},
-                           {"HackProduct", text("oNDREL5,1"), kPhone, kTwo, false, overridden({})},
-                           {"HackOtherText", text("q3%s5"), kPhone, kTwo, false, unsupported("q3%s5")},
-                           {"HackEmptyText", text(""), kPhone, kTwo, false, unsupported("")},
-                           {"HackFalse", PropertyValue::boolean(false), kPhone, kTwo, false, unsupported("false")},
-                           {"HackNumber", PropertyValue::integer(35), kPhone, kTwo, false, unsupported("35")}};
+const std::string kHuge =
+    "getDeviceTreeInt: value for class property of IODeviceTree:/baseband is invalid (<02020202 02020202 02020202 "
+    "02020202 … 65536 bytes>)";
+
+const Device kDevices[] = {
+    {"Phone", {}, kPhone, kTwo, true, found("Ondrel9,2", true, 2)},
+    {"OldBaseband", {}, kPhone, kOne, false, found("Ondrel9,2", true, 1)},
+    {"NegativeClass", {}, kPhone, "\xfe\xff\xff\xff", false, found("Ondrel9,2", true, -2)},
+    {"NothingKnown", {}, {}, "", false, after(kNoClass, found("(null)", false, -1))},
+    {"NoProductType", {}, kUnnamed, kTwo, true, found("(null)", true, 2)},
+    {"AnswersOfOtherKinds", {}, kOdd, kTwo, true, found("(null)", false, 2)},
+    {"WideClass", {}, kPhone, kTwo + kTwo, false, after(kWide, found("Ondrel9,2", true, -1))},
+    {"HugeClass", {}, kPhone, std::string(70'000, '\2'), false, after(kHuge, found("Ondrel9,2", true, -1))},
+    {"Board", {}, kBoard, kTwo, false, overridden({kFpga})},
+    {"HackMachine", text("Q35"), kPhone, kTwo, false, overridden({})},
+    {"HackProduct", text("oNDREL5,1"), kPhone, kTwo, false, overridden({})},
+    {"HackOtherText", text("q3%s5"), kPhone, kTwo, false, unsupported("q3%s5")},
+    {"HackEmptyText", text(""), kPhone, kTwo, false, unsupported("")},
+    {"HackFalse", PropertyValue::boolean(false), kPhone, kTwo, false, unsupported("false")},
+    {"HackNumber", PropertyValue::integer(35), kPhone, kTwo, false, unsupported("35")}};
 INSTANTIATE_TEST_SUITE_P(Devices, DeviceType, testing::ValuesIn(kDevices),
                          [](const auto& instance) { return instance.param.name; });
 

@@ -7,6 +7,7 @@
 #include "linux/device/sources/machine_id.h"
 #include "platform/device_information.h"
 #include "platform/device_paths.h"
+#include "platform/preferences.h"
 #include "platform/telephony.h"
 #include "support/scratch_root.h"
 
@@ -285,6 +286,31 @@ TEST(DeviceFacts, AHostileFileIsAMissingFact) {
   root.make_directory("/sys/class/dmi/id/product_sku");
   root.make_link("/sys/class/power_supply", "/sys/class/power_supply");
   EXPECT_EQ(answers(), Answers{});
+}
+
+TEST(DeviceFacts, AFileThatCannotBeUsedIsToldOfOnce) {
+  ScratchRoot root;
+  const auto said = [](const auto& ask) {
+    testing::internal::CaptureStderr();
+    for (int i = 0; i < 2; ++i) EXPECT_FALSE(ask());
+    return testing::internal::GetCapturedStderr();
+  };
+  const auto answer = [] { return copy_device_answer("SerialNumber"); };
+  const auto preference = [] { return platform::copy_preference("Key", "com.example"); };
+  const std::string of_answers = "/etc/quorvel/device_information.plist", kept = encoded(dictionary({{"a", 1}}));
+  const std::string of_domain = "/private/var/mobile/Library/Preferences/com.example.plist";
+  const std::string unusable = " does not hold a dictionary as a binary property list\n";
+  EXPECT_EQ(said(answer) + said(preference), "") << "absent";
+  for (const std::string& content : {std::string("<?xml version=\"1.0\"?>"), encoded(array({1})), std::string()}) {
+    for (const std::string& path : {of_answers, of_domain}) root.write_file(path, content);
+    EXPECT_EQ(said(answer), "quorveld: " + of_answers + unusable);
+    EXPECT_EQ(said(preference), "quorveld: " + of_domain + unusable);
+    for (const std::string& path : {of_answers, of_domain}) root.write_file(path, kept);
+    EXPECT_EQ(said(answer) + said(preference), "") << "usable";
+  }
+  root.remove(of_answers);
+  root.make_link(of_answers, of_answers);
+  EXPECT_EQ(said(answer), "quorveld: cannot open " + of_answers + ": Too many levels of symbolic links\n");
 }
 
 TEST(DeviceFacts, WhatNobodyMayReadIsNoFact) {

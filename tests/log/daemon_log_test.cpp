@@ -13,6 +13,16 @@
 #include "platform/descriptor.h"
 #include "support/scratch_root.h"
 
+// Takes the place of the C library's in this process.
+static std::optional<time_t> clock_says;
+extern "C" time_t time(time_t* out) noexcept {
+  timespec now{};
+  ::clock_gettime(CLOCK_REALTIME, &now);
+  const time_t result = clock_says.value_or(now.tv_sec);
+  if (out != nullptr) *out = result;
+  return result;
+}
+
 namespace quorvel::test {
 
 TEST(DaemonLog, WritesTheLineFormat) {
@@ -27,6 +37,27 @@ TEST(DaemonLog, WritesTheLineFormat) {
       " \\(0x[0-9a-f]+\\) ";
   EXPECT_TRUE(std::regex_match(log, std::regex(head + "data_ark_set: dirtied by changing -Key\n" + head + ": 100%\n")))
       << log;
+}
+
+TEST(DaemonLog, TellsWhateverTheClockSaysInTheZoneOfTheMoment) {
+  ScratchRoot root;
+  root.ignore_log();
+  const struct {
+    time_t clock;
+    const char* zone;
+    const char* stamp;
+  } cases[] = {{-1, "UTC0", "Wed Dec 31 23:59:59 1969"},
+               {1'800'000'000, "UTC0", "Fri Jan 15 08:00:00 2027"},
+               {1'800'000'001, "ABC-9", "Fri Jan 15 17:00:01 2027"},
+               {300'000'000'000, "DEF3", "Tue Aug 15 02:20:00 11476"},
+               {0, "DEF3", "Wed Dec 31 21:00:00 1969"}};
+  for (const auto& one : cases) {
+    clock_says = one.clock;
+    ::setenv("TZ", one.zone, 1);
+    daemon_log(0, "f", "m");
+    const std::string log = root.read_file(kLogFile);
+    EXPECT_TRUE(log.substr(log.rfind('\n', log.size() - 2) + 1).starts_with(one.stamp + std::string(" pid="))) << log;
+  }
 }
 
 TEST(DaemonLog, InsertsEveryKindOfArgument) {

@@ -79,6 +79,8 @@ TEST_F(Quorvelctl, ReadsTheSavedArkAsTheDaemonWould) {
       {{"ark", "get", "ProductVersion", "--json"}, 0, "\"2.5\"\n"},
       {{"ark", "get", "--domain", "com.Orvane.mobile.internal", "DiagData"}, 1, ""},
   });
+  root.write_file("/etc/quorvel/device_information.plist", "garbage");
+  expect_calls({{{"ark", "get", "UniqueDeviceID"}, 3, ""}});
   root.write_file(kDataFile, "bplist00");
   expect_calls({{{"ark", "list"}, 3, ""}});
 }

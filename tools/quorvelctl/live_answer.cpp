@@ -1,6 +1,8 @@
 #include "live_answer.h"
 
+#include "files.h"
 #include "platform/device_information.h"
+#include "platform/device_paths.h"
 #include "platform/device_questions.h"
 #include "store/live_answers.h"
 #include "telephony_look.h"
@@ -20,6 +22,9 @@ LiveAnswer live_answer(const std::string& domain, bool has_domain, const std::st
   const larry_info* row =
       find_live_answer(has_domain ? PropertyValue::string(domain) : PropertyValue(), PropertyValue::string(key));
   if (row == nullptr) return {};
+  // The file is asked before the machine: one that is there and cannot be used is told of instead of the machine's
+  // word.
+  static_cast<void>(read_device_plist(paths::kDeviceInformation));
   look_at_telephony();
   return live_answer(*row);
 }

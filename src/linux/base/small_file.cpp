@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "linux/base/error_line.h"
 #include "platform/file_system.h"
 #include "property/binary/binary.h"
 
@@ -29,22 +30,33 @@ constexpr std::size_t kLeastRead = 4096;
 
 }  // namespace
 
-bool read_small_file(const Descriptor& file, std::size_t maximum, ByteBuffer& out) noexcept {
+bool read_small_file(const Descriptor& file, std::size_t maximum, ByteBuffer& out, LongFile long_file) noexcept {
   struct stat status;
   if (::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) return false;
-  const auto announced = static_cast<std::size_t>(std::max<off_t>(status.st_size, 0));
+  auto announced = static_cast<std::size_t>(std::max<off_t>(status.st_size, 0));
+  if (long_file == LongFile::cut) announced = std::min(announced, maximum);
   // Files of the kernel announce any size; a byte more than the content lets one read find the end.
   if (announced > maximum || !out.reserve(announced + 1)) return false;
   ssize_t count = 1;
   while (count > 0 && out.size() <= maximum) count = read_more(file.get(), out);
+  if (long_file == LongFile::cut && out.size() > maximum) return count > 0 && out.resize(maximum);
   return count == 0;
 }
 
-PropertyValue read_file_entry(const char* path, std::string_view key) noexcept {
+PropertyValue read_file_entry(const char* path, std::string_view key, std::atomic<bool>& told) noexcept {
   const Descriptor file(open_file(path, kSmallFileFlags, 0));
+  if (!file) {
+    const bool absent = errno == ENOENT || errno == ENOTDIR;
+    if (!told.exchange(!absent) && !absent) print_system_error("cannot open %s", path);
+    return nullptr;
+  }
   ByteBuffer content;
-  if (!file || !read_small_file(file, kMaximumPropertyList, content)) return nullptr;
-  return read_binary(content.bytes(), Mutability::immutable).get(key);
+  PropertyValue list;
+  if (read_small_file(file, kMaximumPropertyList, content)) list = read_binary(content.bytes(), Mutability::immutable);
+  const bool usable = list.is_dictionary();
+  if (!told.exchange(!usable) && !usable)
+    print_error_line("%s does not hold a dictionary as a binary property list", path);
+  return list.get(key);
 }
 
 }  // namespace quorvel::platform::host

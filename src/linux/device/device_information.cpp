@@ -11,7 +11,8 @@ namespace quorvel::platform {
 
 // Packaging knows the device better than the kernel does, so its file is asked first, whatever the question.
 DeviceAnswer copy_device_answer_with_origin(std::string_view question) noexcept {
-  if (PropertyValue answer = host::read_file_entry(paths::kDeviceInformation, question)) {
+  static constinit std::atomic<bool> told = false;
+  if (PropertyValue answer = host::read_file_entry(paths::kDeviceInformation, question, told)) {
     return {std::move(answer), PropertyValue::string(paths::kDeviceInformation)};
   }
   const auto* row =

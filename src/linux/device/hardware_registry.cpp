@@ -51,7 +51,7 @@ PropertyValue RegistryEntry::copy_property(std::string_view name) const noexcept
   std::memcpy(file_name, name.data(), name.size());
   const Descriptor file = open_property(directory_.get(), file_name);
   ByteBuffer content;
-  if (!file || !host::read_small_file(file, kMaximumProperty, content)) return nullptr;
+  if (!file || !host::read_small_file(file, kMaximumProperty, content, host::LongFile::cut)) return nullptr;
   return PropertyValue::data(content.bytes());
 }
 

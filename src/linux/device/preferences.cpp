@@ -15,7 +15,9 @@ PropertyValue copy_preference(std::string_view key, std::string_view domain) noe
   const int length = std::snprintf(path, sizeof path, "%s/%.*s.plist", paths::kPreferencesDirectory,
                                    static_cast<int>(domain.size()), domain.data());
   if (length < 0 || static_cast<std::size_t>(length) >= sizeof path) return nullptr;
-  return host::read_file_entry(path, key);
+  // The daemon asks for one domain.
+  static constinit std::atomic<bool> told = false;
+  return host::read_file_entry(path, key, told);
 }
 
 bool has_integer_preference(std::string_view key, std::string_view domain) noexcept {
