@@ -21,7 +21,7 @@ PropertyValue make_mutable(PropertyValue value) noexcept {
 // A dictionary that two values refer to is copied before it changes, so a second reference is the snapshot: it needs no
 // memory that could run out, and keeps every entry alive until the callback has seen it.
 void dict_for_each(const PropertyValue& dictionary, DictionaryCallback callback, void* context) noexcept {
-  const PropertyValue snapshot = dictionary;
+  const PropertyValue snapshot = dictionary;  // NOLINT(performance-unnecessary-copy-initialization): see above
   for (const auto& [key, value] : snapshot.entries()) callback(key, value, context);
 }
 

@@ -147,7 +147,8 @@ TEST(HardwareRegistry, PropertiesAreFilesOfTheEntry) {
   const RegistryEntry entry = RegistryEntry::open("IODeviceTree:/baseband");
   ASSERT_TRUE(entry);
   EXPECT_EQ(entry.copy_property("class"), data(std::string_view("\x02\0\0\0", 4)));
-  for (const std::string_view name : {"missing", "large", "child", "child/name", "..", "", "fifo", "link"})
+  EXPECT_EQ(entry.copy_property("large").bytes().size(), 64u << 10);
+  for (const std::string_view name : {"missing", "child", "child/name", "..", "", "fifo", "link"})
     EXPECT_EQ(entry.copy_property(name), PropertyValue()) << name;
   EXPECT_FALSE(RegistryEntry::open("IODeviceTree:/missing"));
   EXPECT_FALSE(RegistryEntry::open("IODeviceTree:/baseband/class"));

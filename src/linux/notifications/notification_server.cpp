@@ -12,6 +12,13 @@
 
 namespace quorvel::platform::host {
 
+namespace {
+
+// As many as a socket lets wait to be accepted, unless the kernel was told otherwise.
+constexpr int kLongestQueue = 4096;
+
+}  // namespace
+
 bool NotificationServer::start() noexcept {
   socket_ = ListeningSocket::open(wire::kNotificationSocket);
   if (!socket_) return false;
@@ -85,7 +92,7 @@ void NotificationServer::serve_news() noexcept {
   queue_.silence();
   woken_.store(false);
   const std::uint64_t newest = ring_.newest();
-  if (!listener_.is_resting()) accept_all();
+  if (!listener_.is_resting()) accept_waiting();
   served_ = newest;
   NotificationObserver* next = nullptr;
   for (NotificationObserver* observer = observers_.front(); observer != nullptr; observer = next) {
@@ -121,8 +128,11 @@ void NotificationServer::forget_served() noexcept {
   ring_.forget(position);
 }
 
-void NotificationServer::accept_all() noexcept {
-  while (places_.bear_one_more()) {
+// Everybody who is waiting when the round begins. Those who connect without end are left to the next one, so that they
+// cannot keep the others from being served.
+void NotificationServer::accept_waiting() noexcept {
+  for (int accepted = 0; places_.bear_one_more(); ++accepted) {
+    if (accepted == kLongestQueue) return;
     Descriptor socket = listener_.accept();
     if (!socket) return;
     if (!take_in(std::move(socket))) break;

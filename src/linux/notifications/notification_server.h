@@ -45,7 +45,7 @@ class NotificationServer {
   void serve(NotificationObserver& observer) noexcept;
   void remove(NotificationObserver& observer) noexcept;
   void forget_served() noexcept;
-  void accept_all() noexcept;
+  void accept_waiting() noexcept;
   [[nodiscard]] bool take_in(Descriptor socket) noexcept;
   void make_room() noexcept;
 

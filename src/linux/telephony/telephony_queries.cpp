@@ -19,7 +19,7 @@ struct LastState {
 // Never destroyed: threads may still ask while the process ends.
 LastState& last_state() noexcept {
   alignas(LastState) static unsigned char storage[sizeof(LastState)];
-  static LastState* const last = ::new (storage) LastState;
+  static auto* const last = ::new (storage) LastState;
   return *last;
 }
 
