@@ -7,7 +7,6 @@
 namespace quorvel::test {
 namespace {
 
-constexpr const char* kService = "org.freedesktop.ModemManager1";
 constexpr const char* kModem = "org.freedesktop.ModemManager1.Modem";
 const std::string kModemPath = "/org/freedesktop/ModemManager1/Modem/0";
 const std::string kCardPath = "/org/freedesktop/ModemManager1/SIM/0";
@@ -20,8 +19,12 @@ Properties modem() {
           {"OwnNumbers", variant("as", 1, "+1")},
           {"Revision", variant("s", "FW")}};
 }
-Properties card(const char* iccid) {
-  return {{"SimIdentifier", variant("s", iccid)}, {"Imsi", variant("s", "26202")}, {"Gid1", variant("ay", 1, 0xab)}};
+Properties card(const std::string& iccid) {
+  // The message is made later, when the caller's text may have ended.
+  const Append identifier = [iccid](sd_bus_message* message) {
+    return sd_bus_message_append(message, "v", "s", iccid.c_str());
+  };
+  return {{"SimIdentifier", identifier}, {"Imsi", variant("s", "26202")}, {"Gid1", variant("ay", 1, 0xab)}};
 }
 Properties with(Properties properties, const std::string& name, Append value) {
   properties[name] = std::move(value);
@@ -91,7 +94,7 @@ class Bridge : public testing::Test {
   }
 
   // Has the bridge read the card `iccid`, and waits until that is what it serves.
-  void expect_to_read(const char* iccid, const std::string& after) {
+  void expect_to_read(const std::string& iccid, const std::string& after) {
     bus.answer("GetManagedObjects", modems_of({{kModemPath, modem()}}));
     bus.answer(kCardPath, dictionary_of(card(iccid)));
     tell_modem_changed();
@@ -250,7 +253,7 @@ TEST_F(Bridge, OutlivesAHostileBus) {
     tell_modem_changed();
     EXPECT_TRUE(eventually([&] { return bus.calls("GetManagedObjects") > before; }, 20s)) << name << program->err();
     EXPECT_TRUE(shown().is_dictionary()) << name << "nobody is answered";
-    expect_to_read(std::to_string(++number).c_str(), name);
+    expect_to_read(std::to_string(++number), name);
   }
   EXPECT_EQ(program->err().find('\033'), std::string::npos);
   EXPECT_EQ(program->stop().status, 0);

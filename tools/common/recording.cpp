@@ -41,8 +41,9 @@ std::vector<RecordedStep> read_recording(const std::string& path, int status) {
   for (std::string line; std::getline(file, line);) {
     ++number;
     if (line.empty()) continue;
-    const std::string refusal = take_step(line, step);
-    if (!refusal.empty()) throw Failure{status, path + ", line " + std::to_string(number) + ": " + refusal};
+    if (const std::string refusal = take_step(line, step); !refusal.empty()) {
+      throw Failure{status, std::string(path).append(", line ").append(std::to_string(number)).append(": ") + refusal};
+    }
     steps.push_back(step);
   }
   if (steps.empty()) throw Failure{status, path + " holds no recording. Make one with: quorvelctl sim record FILE"};
