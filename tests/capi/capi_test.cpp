@@ -129,28 +129,6 @@ TEST(CValues, ChangeOnlyThroughTheirOwnHandle) {
   for (quorvel_value* value : {first, second, decoded}) quorvel_value_free(value);
 }
 
-// A service that sends a client what it is told to, in pieces, and keeps the connection open if asked.
-class Service {
- public:
-  Service(const char* name, std::vector<std::string> pieces, bool hold) : listener_(listen_on(name)) {
-    thread_ = std::thread([this, pieces = std::move(pieces), hold] {
-      for (int clients = 0; clients < 2; ++clients) {
-        SocketPeer peer = accept_from(listener_);
-        for (const std::string& piece : pieces) {
-          peer.send(piece);
-          std::this_thread::sleep_for(1ms);
-        }
-        while (hold && peer.receive()) continue;
-      }
-    });
-  }
-  ~Service() { thread_.join(); }
-
- private:
-  Descriptor listener_;
-  std::thread thread_;
-};
-
 // Polls as an event loop does: one step each time the descriptor is readable.
 int step_to_the_end(const Call& call, quorvel_value** reply, quorvel_error* error) {
   for (;;) {
@@ -180,18 +158,20 @@ TEST(CClient, TellsHowAServiceMisbehavesWaitingOrNot) {
       {"closes at once", {}, false, QUORVEL_DISCONNECTED},
       {"closes within the reply", {reply.substr(0, reply.size() - 1)}, false, QUORVEL_DISCONNECTED},
       {"says nothing", {}, true, QUORVEL_TIMED_OUT},
+      {"stops within the reply", {reply.substr(0, 20)}, true, QUORVEL_TIMED_OUT},
       {"talks without end", std::vector(400, frame_bytes(Kind::reply, 2, "", text("x"))), true, QUORVEL_TIMED_OUT},
       {"sends rubbish", {std::string(64, '\xff')}, true, QUORVEL_PROTOCOL_ERROR},
       {"announces too much", {std::string("\x7f\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1", 16)}, true, QUORVEL_PROTOCOL_ERROR},
       {"replies with no list", {std::string("\0\0\0\1\2\0\0\0\0\0\0\0\0\0\0\1n", 17)}, true, QUORVEL_PROTOCOL_ERROR},
       {"fails", {busy}, true, QUORVEL_SERVICE_FAILURE},
+      {"fails oddly", {frame_bytes(Kind::failure, 1, "", text("x"))}, true, QUORVEL_SERVICE_FAILURE},
   };
   static_cast<void>(listen_on(kService));  // the root itself stays open from here on
   root.remove(std::string("/run/quorvel/") + kService);
   const std::size_t before = descriptors_open();
   for (const Case& test : cases) {
     {
-      const Service service(kService, test.pieces, test.hold);
+      const FakeService service(kService, test.pieces, test.hold, 2);
       const Client client = new_client(test.code == QUORVEL_TIMED_OUT ? 100 : 20'000);
       for (const bool waiting : {true, false}) {
         quorvel_error error{};
@@ -210,7 +190,7 @@ TEST(CClient, TellsHowAServiceMisbehavesWaitingOrNot) {
         EXPECT_EQ(error.code, test.code) << test.what;
         EXPECT_EQ(answer != nullptr, test.code == QUORVEL_OK && test.pieces.size() > 1) << test.what;
         EXPECT_EQ(std::strlen(error.sentence) > 0, test.code != QUORVEL_OK) << test.what;
-        EXPECT_EQ(error.service_code, test.code == QUORVEL_SERVICE_FAILURE ? 7 : 0) << test.what;
+        EXPECT_EQ(error.service_code, test.pieces == std::vector{busy} ? 7 : 0) << test.what;
         quorvel_value_free(answer);
       }
     }
@@ -246,12 +226,12 @@ TEST(CObserver, HearsOfNotificationsAndWhatItMissed) {
   EXPECT_EQ(std::string_view(QUORVEL_PHONE_NUMBER_CHANGED), kPhoneNumberChangedNotification.text());
   const std::string changed = QUORVEL_PHONE_NUMBER_CHANGED;
   // All at once: the descriptor has to stay readable for a caller who takes one step each time.
-  const Service service(
+  const FakeService service(
       "notifications.sock",
       {frame_bytes(Kind::ready, 41, "") + frame_bytes(Kind::notification, 42, changed, text(changed)) +
        frame_bytes(Kind::missed, 50, "", PropertyValue::integer(8)) + frame_bytes(Kind::notification, 51, "plain") +
        frame_bytes(Kind::state, 1, "")},
-      true);
+      true, 2);
   const Client client = new_client();
   for (const bool waiting : {true, false}) {
     const Observer observer(quorvel_observer_start(client.get(), nullptr), quorvel_observer_free);

@@ -18,80 +18,11 @@ using namespace quorvel::test;
 constexpr const char* kService = "com.Orvane.quorveld.sock";
 const std::string kSocket = "/run/quorvel/com.Orvane.quorveld.sock";
 
-// A service that takes one connection, sends what it is told to in pieces, and keeps the connection open if asked.
-class Service {
- public:
-  Service(std::string_view name, std::vector<std::string> pieces, bool hold) : listener_(listen_on(name)) {
-    thread_ = std::thread([this, sent = std::move(pieces), hold] {
-      SocketPeer connection = accept_from(listener_);
-      for (const std::string& piece : sent) {
-        connection.send(piece);
-        std::this_thread::sleep_for(2ms);
-      }
-      while (hold && connection.receive()) continue;
-    });
-  }
-  ~Service() { thread_.join(); }
-
- private:
-  Descriptor listener_;
-  std::thread thread_;
-};
-
 class ClientTest : public testing::Test {
  protected:
   // A root whose path is far longer than a socket address.
   ScratchRoot root{std::string(150, 'a') + "/" + std::string(150, 'b')};
 };
-
-TEST_F(ClientTest, TellsHowAServiceMisbehaves) {
-  using Kind = wire::FrameKind;
-  const std::string reply = frame_bytes(Kind::reply, 1, "", text("answer"));
-  const std::string state = frame_bytes(Kind::state, 0, "", dictionary({}));
-  const std::string too_much("\x7f\0\0\0\2\0\0\0\0\0\0\0\0\0\0\1", 16);
-  const std::string no_list("\0\0\0\4\2\0\0\0\0\0\0\0\0\0\0\1nope", 20);
-  const std::string busy = frame_bytes(Kind::failure, 1, "", dictionary({{"Code", 7}, {"Description", "busy"}}));
-  std::vector<std::string> trickle;
-  for (const char byte : state + reply) trickle.emplace_back(1, byte);
-  struct Case {
-    const char* what;
-    std::vector<std::string> pieces;
-    bool hold;
-    std::optional<ErrorCode> error;
-  };
-  const Case cases[] = {
-      {"a byte at a time, other frames first", trickle, true, std::nullopt},
-      {"closes at once", {}, false, ErrorCode::disconnected},
-      {"closes within the reply", {reply.substr(0, reply.size() - 1)}, false, ErrorCode::disconnected},
-      {"says nothing", {}, true, ErrorCode::timed_out},
-      {"stops within the reply", {reply.substr(0, 20)}, true, ErrorCode::timed_out},
-      {"answers another call", {frame_bytes(Kind::reply, 2, "", text("x"))}, true, ErrorCode::timed_out},
-      {"announces more than the limit", {too_much}, true, ErrorCode::protocol_error},
-      {"sends garbage", {std::string(64, '\xff')}, true, ErrorCode::protocol_error},
-      {"replies with no property list", {no_list}, true, ErrorCode::protocol_error},
-      {"fails", {busy}, true, ErrorCode::service_failure},
-      {"fails oddly", {frame_bytes(Kind::failure, 1, "", array({1}))}, true, ErrorCode::service_failure},
-  };
-  static_cast<void>(listen_on(kService));  // the root itself stays open from here on
-  root.remove(kSocket);
-  const std::size_t before = descriptors_open();
-  for (const Case& test : cases) {
-    {
-      Service service(kService, test.pieces, test.hold);
-      Options options;
-      options.timeout = test.error == ErrorCode::timed_out ? 100ms : 20s;
-      const Reply answer = Client(options).copy_regulatory_images();
-      EXPECT_EQ(answer.error ? std::optional(answer.error->code) : std::nullopt, test.error) << test.what;
-      EXPECT_TRUE(!answer.error || !answer.error->description.empty()) << test.what;
-      if (test.error == ErrorCode::service_failure && answer.error->service_code != 0) {
-        EXPECT_EQ(answer.error->description, "busy");
-        EXPECT_EQ(answer.error->service_code, 7);
-      }
-    }
-    root.remove(kSocket);
-  }
-  EXPECT_EQ(descriptors_open(), before);
-}
 
 TEST_F(ClientTest, SendsACallThatNoSocketBufferHolds) {
   const PropertyValue argument = test::data(std::string(4 << 20, 'x'));
@@ -141,7 +72,7 @@ TEST_F(ClientTest, TellsWhyThereIsNoService) {
 TEST_F(ClientTest, CompletesOnceOnAThreadOfItsOwn) {
   // A link in the socket's place is taken inside the device root, as every path is.
   root.make_link("/run/quorvel/elsewhere.sock", kSocket);
-  Service service("elsewhere.sock", {frame_bytes(wire::FrameKind::reply, 1, "", text("answer"))}, false);
+  const FakeService service("elsewhere.sock", {frame_bytes(wire::FrameKind::reply, 1, "", text("answer"))}, false);
   std::promise<std::pair<std::thread::id, std::string>> completed;
   {
     const PendingCall call = Client().copy_regulatory_images([&completed](const Reply& reply) {
@@ -155,7 +86,7 @@ TEST_F(ClientTest, CompletesOnceOnAThreadOfItsOwn) {
 
 TEST_F(ClientTest, ObservesNotificationsAndWhatItMissed) {
   using Kind = wire::FrameKind;
-  Service service(
+  const FakeService service(
       "notifications.sock",
       {frame_bytes(Kind::ready, 41, "", {}), frame_bytes(Kind::notification, 42, "changed", text("changed")),
        frame_bytes(Kind::missed, 50, "", PropertyValue::integer(8)), frame_bytes(Kind::reply, 1, "", {})},

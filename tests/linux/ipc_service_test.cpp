@@ -1,7 +1,7 @@
 // The IPC service against real clients: well-behaved, odd and hostile.
 #include <sys/socket.h>
-#include <sys/uio.h>
 
+#include <array>
 #include <thread>
 
 #include "platform/ipc.h"
@@ -151,21 +151,7 @@ TEST_F(IpcService, RefusesAttachedDescriptorsWhereTheKernelCan) {
   constexpr int kPassRights = 83;
   if (::getsockopt(peer.descriptor(), SOL_SOCKET, kPassRights, &none, &size) != 0)
     GTEST_SKIP() << "this kernel cannot refuse descriptors";
-  std::string bytes = call("echo", 1);
-  iovec part = {bytes.data(), bytes.size()};
-  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
-  msghdr message = {};
-  message.msg_iov = &part;
-  message.msg_iovlen = 1;
-  message.msg_control = control;
-  message.msg_controllen = sizeof control;
-  cmsghdr* attached = CMSG_FIRSTHDR(&message);
-  attached->cmsg_level = SOL_SOCKET;
-  attached->cmsg_type = SCM_RIGHTS;
-  attached->cmsg_len = CMSG_LEN(sizeof(int));
-  const int attachment = STDERR_FILENO;
-  std::memcpy(CMSG_DATA(attached), &attachment, sizeof attachment);
-  EXPECT_EQ(::sendmsg(peer.descriptor(), &message, MSG_NOSIGNAL), -1);
+  EXPECT_EQ(send_attached(peer.descriptor(), call("echo", 1), std::array{STDERR_FILENO}), -1);
   EXPECT_EQ(errno, EPERM);
   expect_served(peer);
 }

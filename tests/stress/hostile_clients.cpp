@@ -26,23 +26,6 @@ std::vector<std::string> rubbish() {
   };
 }
 
-void send_with_descriptors(const SocketPeer& peer, std::string bytes) {
-  constexpr std::size_t kAttached = 16;
-  iovec part = {bytes.data(), bytes.size()};
-  alignas(cmsghdr) char control[CMSG_SPACE(kAttached * sizeof(int))] = {};
-  msghdr message = {};
-  message.msg_iov = &part;
-  message.msg_iovlen = 1;
-  message.msg_control = control;
-  message.msg_controllen = sizeof control;
-  cmsghdr* header = CMSG_FIRSTHDR(&message);
-  header->cmsg_level = SOL_SOCKET;
-  header->cmsg_type = SCM_RIGHTS;
-  header->cmsg_len = CMSG_LEN(kAttached * sizeof(int));
-  std::fill_n(reinterpret_cast<int*>(CMSG_DATA(header)), kAttached, STDIN_FILENO);
-  static_cast<void>(::sendmsg(peer.descriptor(), &message, MSG_DONTWAIT | MSG_NOSIGNAL));
-}
-
 }  // namespace
 
 HostileClients::~HostileClients() {
@@ -110,7 +93,7 @@ void HostileClients::reconnect() {
     if (!peer) continue;
     const std::string& message = messages[i % messages.size()];
     if (i % 2 == 0 && !message.empty())
-      send_with_descriptors(peer, message);
+      send_attached(peer.descriptor(), message, std::vector<int>(16, STDIN_FILENO));
     else
       peer.send(message);
     ++reconnections_;

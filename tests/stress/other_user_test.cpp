@@ -7,13 +7,12 @@
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/syscall.h>
-#include <sys/uio.h>
-#include <sys/un.h>
 #include <sys/wait.h>
+
+#include <array>
 
 #include "linux/base/local_socket.h"
 #include "stress/stressed_daemon.h"
-#include "wire/service_path.h"
 
 namespace quorvel::test {
 namespace {
@@ -69,22 +68,9 @@ Descriptor lingering_socket() {
   return writer;
 }
 
-// Returns how many messages were sent.
-std::size_t send_attached(int socket, std::string bytes, const Descriptor& attachment) {
-  iovec part = {bytes.data(), bytes.size()};
-  alignas(cmsghdr) char control[CMSG_SPACE(sizeof(int))] = {};
-  msghdr message = {};
-  message.msg_iov = &part;
-  message.msg_iovlen = 1;
-  message.msg_control = control;
-  message.msg_controllen = sizeof control;
-  cmsghdr* const attached = CMSG_FIRSTHDR(&message);
-  attached->cmsg_level = SOL_SOCKET;
-  attached->cmsg_type = SCM_RIGHTS;
-  attached->cmsg_len = CMSG_LEN(sizeof(int));
-  const int number = attachment.get();
-  std::memcpy(CMSG_DATA(attached), &number, sizeof number);
-  return ::sendmsg(socket, &message, MSG_DONTWAIT | MSG_NOSIGNAL) > 0 ? 1 : 0;
+bool send_lingering(int socket, std::string_view bytes) {
+  const Descriptor attachment = lingering_socket();
+  return send_attached(socket, bytes, std::array{attachment.get()}) > 0;
 }
 
 void PrintTo(const Attack& attack, std::ostream* out) { *out << attack.name; }
@@ -125,7 +111,7 @@ class OtherUser {
         if (!open) {
           socket = platform::host::connect_local(service);
           if (socket) send(socket, attack.first);
-          if (socket && attack.attaches) *held_ += send_attached(socket.get(), attack.always, lingering_socket());
+          if (socket && attack.attaches) *held_ += send_lingering(socket.get(), attack.always) ? 1 : 0;
         } else {
           send(socket, attack.always);
         }
@@ -250,15 +236,12 @@ TEST(PassedSocket, HoldsUpNobodyWithWhatWasAttachedBefore) {
   root.ignore_log();
   root.make_directory("/run/quorvel");
   constexpr const char* kService = "com.Orvane.quorveld.sock";
-  sockaddr_un address = {AF_UNIX, {}};
-  root.path(std::string("/run/quorvel/") + kService).string().copy(address.sun_path, sizeof address.sun_path - 1);
-  const Descriptor passed(::socket(AF_UNIX, SOCK_STREAM, 0));
-  ASSERT_EQ(::bind(passed.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
-  ASSERT_EQ(::listen(passed.get(), 16), 0);
+  const Descriptor passed = listen_on(kService);
+  ASSERT_EQ(::fcntl(passed.get(), F_SETFD, 0), 0);
   std::vector<SocketPeer> hostile;
   for (int i = 0; i < 6; ++i) {
     hostile.push_back(SocketPeer::connected_to(kService));
-    ASSERT_EQ(send_attached(hostile.back().descriptor(), calls(1), lingering_socket()), 1u);
+    ASSERT_TRUE(send_lingering(hostile.back().descriptor(), calls(1)));
   }
   Program daemon("/bin/bash", {.arguments = {"-c", "exec 3<&" + std::to_string(passed.get()) +
                                                        "; LISTEN_FDS=1 LISTEN_PID=$$ exec " + daemon_program()},

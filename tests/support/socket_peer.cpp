@@ -88,4 +88,33 @@ SocketPeer accept_from(const Descriptor& listener, std::chrono::milliseconds pat
   return SocketPeer(Descriptor(::accept4(listener.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK)));
 }
 
+ssize_t send_attached(int socket, std::string_view bytes, std::span<const int> attached) {
+  iovec part = {const_cast<char*>(bytes.data()), bytes.size()};
+  alignas(cmsghdr) char control[CMSG_SPACE(16 * sizeof(int))] = {};
+  msghdr message = {};
+  message.msg_iov = &part;
+  message.msg_iovlen = 1;
+  message.msg_control = control;
+  message.msg_controllen = CMSG_SPACE(attached.size_bytes());
+  if (message.msg_controllen > sizeof control) throw std::runtime_error("too much to attach");
+  cmsghdr* const header = CMSG_FIRSTHDR(&message);
+  header->cmsg_level = SOL_SOCKET;
+  header->cmsg_type = SCM_RIGHTS;
+  header->cmsg_len = CMSG_LEN(attached.size_bytes());
+  std::memcpy(CMSG_DATA(header), attached.data(), attached.size_bytes());
+  return ::sendmsg(socket, &message, MSG_DONTWAIT | MSG_NOSIGNAL);
+}
+
+FakeService::FakeService(std::string_view name, std::vector<std::string> pieces, bool hold, int clients)
+    : listener_(listen_on(name)), thread_([this, sent = std::move(pieces), hold, clients] {
+        for (int client = 0; client < clients; ++client) {
+          SocketPeer peer = accept_from(listener_);
+          for (const std::string& piece : sent) {
+            peer.send(piece);
+            std::this_thread::sleep_for(1ms);
+          }
+          while (hold && peer.receive()) continue;
+        }
+      }) {}
+
 }  // namespace quorvel::test

@@ -46,4 +46,19 @@ class SocketPeer {
 /// The next client of `listener`; empty when none comes.
 [[nodiscard]] SocketPeer accept_from(const Descriptor& listener, std::chrono::milliseconds patience = kPatience);
 
+/// Sends `bytes` with descriptors attached, without waiting; what `sendmsg` returns.
+ssize_t send_attached(int socket, std::string_view bytes, std::span<const int> attached);
+
+/// A service that sends each of so many clients, one after the other, what it is told to, in pieces, and keeps the
+/// connection open if asked.
+class FakeService {
+ public:
+  FakeService(std::string_view name, std::vector<std::string> pieces, bool hold, int clients = 1);
+  ~FakeService() { thread_.join(); }
+
+ private:
+  Descriptor listener_;
+  std::thread thread_;
+};
+
 }  // namespace quorvel::test
