@@ -47,23 +47,6 @@ std::string next(SocketPeer& observer, std::chrono::milliseconds patience = kPat
          field(state, "iccid") + " " + field(state, "imsi");
 }
 
-// A PropertiesChanged that no library would send: `text` is where the interface should be.
-std::string signal_with(const std::string& text) {
-  const auto number = [](std::size_t value) { return std::string{static_cast<char>(value), '\0', '\0', '\0'}; };
-  const auto padded = [](std::string bytes) { return bytes.append((8 - bytes.size() % 8) % 8, '\0'); };
-  std::string fields;
-  for (const auto& [code, type, value] :
-       std::initializer_list<std::tuple<char, char, std::string>>{{1, 'o', kModemPath},
-                                                                  {2, 's', "org.freedesktop.DBus.Properties"},
-                                                                  {3, 's', "PropertiesChanged"},
-                                                                  {7, 's', ":1.3"}}) {
-    fields = padded(fields) + std::string{code, 1, type, 0} + number(value.size()) + value + '\0';
-  }
-  fields = padded(fields) + std::string{8, 1, 'g', 0, 1, 's', 0};
-  const std::string body = number(text.size()) + text + '\0';
-  return padded(std::string{'l', 4, 0, 1} + number(body.size()) + number(77) + number(fields.size()) + fields) + body;
-}
-
 class Bridge : public testing::Test {
  protected:
   Bridge() {
@@ -239,9 +222,7 @@ TEST_F(Bridge, OutlivesAHostileBus) {
                          body("u", 1u));
        }},
       {"garbage", [&] { bus.send_bytes(std::string(4096, '\x7f')); }},
-      {"an invalid text", [&] { bus.send_bytes(signal_with("\xff\xfe")); }},
-      {"a text without an end", [&] { bus.send_bytes(signal_with(std::string("text\1", 5))); }},
-      {"a part of a message", [&] { bus.send_bytes(signal_with("text").substr(0, 99)), bus.disconnect(); }},
+      {"a part of a message", [&] { bus.send_bytes("l"), bus.disconnect(); }},
       {"an end", [&] { bus.disconnect(); }},
   };
   start();

@@ -193,6 +193,11 @@ TEST(Facts, FollowsThePinnedDeviceAndHidesIdentities) {
                   .take(of({ready("8949353", "262021")}), {})
                   .lines.back()
                   .ends_with(", card 8949353, subscriber 262021"));
+  Facts two;
+  const Telling chosen = two.take(of({called("a", in_state(ModemState::no_card, 2)), called("b", ready())}), {});
+  EXPECT_TRUE(chosen.lines.front().starts_with("following the modem b, the best of ")) << chosen.lines.front();
+  EXPECT_EQ(two.take(of({called("a", ready("B", "2"))}), {}).lines,
+            std::vector<std::string>({"waiting up to 10 s for the modem b, which went away"}));
   EXPECT_EQ(described(telling.state.get("postponement").get("Value")),
             R"({"Status": "Ready", "IntegratedCircuitCardIdentity": "8949353", )"
             R"("InternationalMobileSubscriberIdentity": "262021", "InternationalMobileEquipmentIdentity": "", )"
