@@ -5,6 +5,7 @@
 
 #include "linux/device/source_table.h"
 #include "linux/device/sources/machine_id.h"
+#include "linux/device/sources/parsing.h"
 #include "platform/device_information.h"
 #include "platform/device_paths.h"
 #include "platform/preferences.h"
@@ -356,14 +357,10 @@ TEST(DeviceFacts, TheTelephonyServicesLastStateAnswers) {
 }
 
 TEST(DeviceFacts, TheIdentifierIsTheOneThatOtherToolsDerive) {
-  const auto bytes = [](std::string_view hexadecimal) {
-    std::array<std::byte, 16> all;
-    for (std::size_t i = 0; i < 16; ++i)
-      all[i] = static_cast<std::byte>(std::stoi(std::string(hexadecimal.substr(2 * i, 2)), nullptr, 16));
-    return all;
-  };
-  const auto text =
-      host::derive_identifier(bytes("0123456789abcdef0123456789abcdef"), bytes("5d1f2c3b4a5968778695a4b3c2d1e0ff"));
+  std::byte machine[16], application[16];
+  ASSERT_TRUE(host::parse_machine_id("0123456789abcdef0123456789abcdef", machine));
+  ASSERT_TRUE(host::parse_machine_id("5d1f2c3b4a5968778695a4b3c2d1e0ff", application));
+  const auto text = host::derive_identifier(machine, application);
   EXPECT_EQ(std::string(text.begin(), text.end()), "e0918de3171a4b559087067af889aba4");
 }
 

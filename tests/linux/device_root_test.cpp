@@ -130,10 +130,6 @@ TEST(SmallSources, AnswerFromTheFilesAsTheyAreNow) {
   root.write_plist(kAnswers, dictionary({{"ProductType", "Two"}}));
   EXPECT_EQ(copy_device_answer("ProductType"), text("Two"));
   EXPECT_EQ(copy_device_answer("Other"), PropertyValue());
-  for (const std::string& content : {std::string("rubbish"), encoded(array({"ProductType"}))}) {
-    root.write_file(kAnswers, content);
-    EXPECT_EQ(copy_device_answer("ProductType"), PropertyValue());
-  }
 }
 
 TEST(HardwareRegistry, PropertiesAreFilesOfTheEntry) {

@@ -146,16 +146,6 @@ TEST_F(TelephonyService, ComesBackAfterAServiceThatLeftOrSentRubbish) {
   EXPECT_EQ(everything(), "sim (null), no connection");
 }
 
-TEST_F(TelephonyService, DeliversABurstThatArrivesAtOnce) {
-  observe(kSimStatusChanged);
-  std::string burst;
-  for (int i = 0; i < 40; ++i) burst += event(dictionary({}));
-  serve([&] {
-    SocketPeer peer = accept_from(listener);
-    EXPECT_TRUE(peer.send(burst) && wait_for_deliveries(40));
-  });
-}
-
 // A device whose service is not there when the daemon starts.
 class LateTelephonyService : public TelephonyService {
  protected:

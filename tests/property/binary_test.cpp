@@ -173,18 +173,6 @@ TEST(Binary, EqualValuesGiveEqualBytes) {
   EXPECT_EQ(encoded(decoded(encoded(up))), encoded(up));
 }
 
-TEST(Binary, ABufferThatIsUsedAgainKeepsItsSize) {
-  ByteBuffer out;
-  const PropertyValue value = dictionary({{"key", "value"}});
-  ASSERT_TRUE(write_binary(value, out));
-  const std::size_t capacity = out.capacity();
-  for (int i = 0; i < 20; ++i) {
-    out.clear();
-    ASSERT_TRUE(write_binary(value, out));
-  }
-  EXPECT_EQ(out.capacity(), capacity);
-}
-
 TEST(Binary, ReferencesAreAsSmallAsTheyCanBe) {
   const auto flags = [](int entries) {
     PropertyValue value = PropertyValue::dictionary();
