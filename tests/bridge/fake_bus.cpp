@@ -74,13 +74,15 @@ void FakeBus::send_signal(const std::string& path, const std::string& interface,
                           const Append& body) {
   const std::lock_guard hold(mutex_);
   for (const Connection& connection : connections_) {
+    if (!connection.has_joined) continue;
+    sd_bus* const to = connection.bus.get();
     sd_bus_message* signal = nullptr;
-    int result = sd_bus_message_new_signal(connection.get(), &signal, path.c_str(), interface.c_str(), member.c_str());
+    int result = sd_bus_message_new_signal(to, &signal, path.c_str(), interface.c_str(), member.c_str());
     if (result >= 0) result = sd_bus_message_set_sender(signal, ":1.3");
     if (result >= 0) result = body(signal);
     EXPECT_GE(result, 0) << "the signal " << member << " cannot be made";
     // Whoever has left meanwhile reads everything when it is back.
-    static_cast<void>(sd_bus_send(connection.get(), signal, nullptr));
+    static_cast<void>(sd_bus_send(to, signal, nullptr));
     sd_bus_message_unref(signal);
   }
 }
@@ -93,7 +95,8 @@ int FakeBus::calls(const std::string& method) {
 void FakeBus::send_bytes(std::string_view bytes) {
   const std::lock_guard hold(mutex_);
   for (const Connection& connection : connections_) {
-    static_cast<void>(::send(sd_bus_get_fd(connection.get()), bytes.data(), bytes.size(), MSG_NOSIGNAL));
+    if (!connection.has_joined) continue;
+    static_cast<void>(::send(sd_bus_get_fd(connection.bus.get()), bytes.data(), bytes.size(), MSG_NOSIGNAL));
   }
 }
 
@@ -114,8 +117,13 @@ int FakeBus::on_message(sd_bus_message* message, void* self, sd_bus_error*) {
   std::string method = sd_bus_message_get_member(message);
   if (method == "GetAll") method = sd_bus_message_get_path(message);
   ++bus.calls_[method];
+  if (method == "Hello") {
+    for (Connection& connection : bus.connections_) {
+      connection.has_joined |= connection.bus.get() == sd_bus_message_get_bus(message);
+    }
+  }
   if (const auto error = bus.errors_.find(method); error != bus.errors_.end()) {
-    EXPECT_GE(sd_bus_reply_method_errorf(message, error->second.c_str(), "it fails"), 0);
+    static_cast<void>(sd_bus_reply_method_errorf(message, error->second.c_str(), "it fails"));
     return 1;
   }
   const auto answer = bus.answers_.find(method);
@@ -124,8 +132,8 @@ int FakeBus::on_message(sd_bus_message* message, void* self, sd_bus_error*) {
   int result = sd_bus_message_new_method_return(message, &reply);
   if (result >= 0) result = sd_bus_message_set_sender(reply, ":1.3");
   if (result >= 0) result = answer->second(reply);
-  if (result >= 0) result = sd_bus_send(nullptr, reply, nullptr);
-  EXPECT_GE(result, 0) << "the answer to " << method << " cannot be sent";
+  EXPECT_GE(result, 0) << "the answer to " << method << " cannot be made";
+  static_cast<void>(sd_bus_send(nullptr, reply, nullptr));
   sd_bus_message_unref(reply);
   return 1;
 }
@@ -145,7 +153,7 @@ void FakeBus::take_connection() {
   if (result >= 0) result = sd_bus_add_filter(bus, nullptr, on_message, this);
   if (result >= 0) result = sd_bus_start(bus);
   EXPECT_GE(result, 0) << "the bus cannot serve";
-  connections_.emplace_back(bus);
+  connections_.emplace_back().bus.reset(bus);
 }
 
 void FakeBus::run() {
@@ -154,7 +162,7 @@ void FakeBus::run() {
     {
       const std::lock_guard hold(mutex_);
       for (const Connection& connection : connections_) {
-        waits.push_back({sd_bus_get_fd(connection.get()), POLLIN, 0});
+        waits.push_back({sd_bus_get_fd(connection.bus.get()), POLLIN, 0});
       }
     }
     // What a test queues meanwhile goes out with the next turn.
@@ -164,7 +172,7 @@ void FakeBus::run() {
     if (waits[1].revents != 0) take_connection();
     std::erase_if(connections_, [](const Connection& connection) {
       int result = 1;
-      while ((result = sd_bus_process(connection.get(), nullptr)) > 0) continue;
+      while ((result = sd_bus_process(connection.bus.get(), nullptr)) > 0) continue;
       return result < 0;
     });
   }

@@ -38,7 +38,7 @@ class FakeBus {
   FakeBus& operator=(const FakeBus&) = delete;
 
   /// What `method` answers from now on; nothing: it never does. `method` is a member's name, or for GetAll the object's
-  /// path.
+  /// path. A reply may send signals, which go out before it.
   void answer(const std::string& method, Append reply);
   void fail(const std::string& method, const std::string& error);
   void send_signal(const std::string& path, const std::string& interface, const std::string& member,
@@ -56,7 +56,10 @@ class FakeBus {
   struct Unref {
     void operator()(sd_bus* bus) const { sd_bus_flush_close_unref(bus); }
   };
-  using Connection = std::unique_ptr<sd_bus, Unref>;
+  struct Connection {
+    std::unique_ptr<sd_bus, Unref> bus;
+    bool has_joined = false;  // said Hello, before which a bus tells nobody anything
+  };
 
   static int on_message(sd_bus_message* message, void* self, sd_bus_error* error);
   void run();
@@ -64,7 +67,7 @@ class FakeBus {
 
   Descriptor listener_;
   Descriptor ending_;
-  std::mutex mutex_;
+  std::recursive_mutex mutex_;
   std::map<std::string, Append> answers_;
   std::map<std::string, std::string> errors_;
   std::map<std::string, int> calls_;
