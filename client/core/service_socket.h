@@ -30,9 +30,12 @@ class ServiceSocket {
   // No service can listen under a longer path: its socket address would not hold it.
   static constexpr std::size_t kPathSize = 108;
 
+  [[nodiscard]] bool open_root(const char* root, Failure& failure) noexcept;
+  [[nodiscard]] Descriptor open_in_root() const noexcept;
   [[nodiscard]] int connect_in_root() const noexcept;
 
-  Descriptor root_;  // until the connection stands
+  Descriptor root_;          // until the connection stands
+  bool is_machine_ = false;  // whether the root is the machine's own
   Descriptor socket_;
   char path_[kPathSize] = {};
 };

@@ -145,11 +145,13 @@ TEST(ProcessStart, RefusesALockFileThatIsNone) {
 
 TEST(ProcessStart, RootLeavesNothingInAnothersPlace) {
   if (::geteuid() != 0) GTEST_SKIP() << "needs to be root";
-  ScratchRoot root;
-  root.make_directory("/run/quorvel");
-  ASSERT_EQ(::chown(root.path("/run/quorvel").c_str(), 12345, 12345), 0);
-  EXPECT_START(77, "^quorveld: /run/quorvel belongs to user 12345: [^\n]*systemctl start quorveld\n$");
-  EXPECT_FALSE(root.exists("/run/quorvel/quorveld.lock"));
+  for (const std::string place : {"/run/quorvel", "/private/var/mobile"}) {
+    ScratchRoot root;
+    root.make_directory(place);
+    ASSERT_EQ(::chown(root.path(place).c_str(), 12345, 12345), 0);
+    EXPECT_START(77, "^quorveld: " + place + " belongs to user 12345: [^\n]*systemctl start quorveld\n$");
+    EXPECT_FALSE(root.exists("/run/quorvel/quorveld.lock"));
+  }
 }
 
 TEST(ProcessStart, TellsTheServiceManagerInOneLineWhatItDoes) {

@@ -26,13 +26,17 @@ namespace {
 
 // Files that root makes in another user's place keep that user's daemon from starting, and from logging.
 [[nodiscard]] bool would_lock_out_the_owner() noexcept {
-  struct stat directory;
-  if (::geteuid() != 0 || file_status(paths::kServiceDirectory, &directory) != 0 || directory.st_uid == 0) return false;
-  print_error_line(
-      "%s belongs to user %u: run as that user, not as root; the installed service starts with: systemctl start "
-      "quorveld",
-      paths::kServiceDirectory, static_cast<unsigned>(directory.st_uid));
-  return true;
+  if (::geteuid() != 0) return false;
+  for (const char* path : {paths::kServiceDirectory, paths::kMobileHome}) {
+    struct stat directory;
+    if (file_status(path, &directory) != 0 || directory.st_uid == 0) continue;
+    print_error_line(
+        "%s belongs to user %u: run as that user, not as root; the installed service starts with: systemctl start "
+        "quorveld",
+        path, static_cast<unsigned>(directory.st_uid));
+    return true;
+  }
+  return false;
 }
 
 // Nobody else may open the file: whoever can open it could hold the lock.
@@ -47,8 +51,8 @@ namespace {
 }  // namespace
 
 int take_instance_lock() noexcept {
-  if (!make_service_directory()) return EX_OSERR;
   if (would_lock_out_the_owner()) return EX_NOPERM;
+  if (!make_service_directory()) return EX_OSERR;
   Descriptor file = open_lock_file();
   if (!file) {
     print_system_error("cannot open the lock file %s", paths::kInstanceLock);
