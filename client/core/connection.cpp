@@ -71,6 +71,8 @@ Progress Connection::send(Failure& failure) noexcept {
       sent_ += static_cast<std::size_t>(count);
     } else if (errno == EAGAIN) {
       return Progress::waiting;
+    } else if (errno == EPIPE) {
+      break;  // what the service said before it went is still there to be read
     } else if (errno != EINTR) {
       return connection_failed(errno, failure);
     }
