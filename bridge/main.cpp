@@ -1,10 +1,12 @@
 // quorvel-modem-bridge: a telephony service on top of ModemManager.
 #include <algorithm>
+#include <chrono>
 #include <cstdio>
+#include <optional>
 
 #include "bridge/facts.h"
 #include "bridge/source.h"
-#include "common/words.h"
+#include "common/command_line.h"
 #include "platform/process.h"
 #include "telephony-service/listener.h"
 #include "telephony-service/program.h"
@@ -89,11 +91,10 @@ int run(int count, char** words) {
   telephony::CallWords call(kWords);
   std::string device;
   bool shows_identities = false;
-  tools::add_word(call.app(), "--device", device, "Follow this modem only: its device, as mmcli -m any prints it")
-      ->option_text("DEVICE");
-  call.app().add_flag(
-      "--show-identities", shows_identities,
-      "Write the identities of card and subscriber to the log in full, not their last four digits alone");
+  tools::add_option(call.app(), "--device", device, "DEVICE",
+                    "Follow this modem only: its device, as mmcli -m any prints it");
+  tools::add_switch(call.app(), "--show-identities", shows_identities,
+                    "Write the identities of card and subscriber to the log in full, not their last four digits alone");
   if (!call.take(count, words)) return 0;
   const Descriptor signals = telephony::open_end_signals();
   auto listener = telephony::claim_listener();

@@ -8,8 +8,10 @@
 #include <cstring>
 #include <memory>
 #include <new>
+#include <optional>
 #include <system_error>
 
+#include "common/command_words.h"
 #include "common/completion.h"
 #include "common/failure.h"
 #include "common/help_text.h"
@@ -23,26 +25,28 @@ namespace quorvel::telephony {
 using tools::Failure;
 
 CallWords::CallWords(const tools::CommandWords& words)
-    : app_(words.about.empty() ? words.summary : words.summary + "\n\n" + words.about, words.name) {
-  app_.formatter(std::make_shared<tools::HelpFormatter>());
-  app_.footer(words.examples);
-  tools::add_word(app_, "--root", root_, tools::kRootHelp)->option_text("DIR");
+    : app_(std::make_unique<CLI::App>(tools::description_of(words), words.name)) {
+  app_->formatter(std::make_shared<tools::HelpFormatter>());
+  app_->footer(words.examples);
+  tools::add_option(*app_, "--root", root_, "DIR", tools::kRootHelp);
 }
 
+CallWords::~CallWords() = default;
+
 bool CallWords::take(int count, char** words) {
-  app_.set_version_flag("--version", app_.get_name() + " " QUORVEL_VERSION, "Print the version and end");
-  if (const std::optional<std::string> answer = tools::answer_for_tools(app_, count, words, {})) {
+  app_->set_version_flag("--version", app_->get_name() + " " QUORVEL_VERSION, "Print the version and end");
+  if (const std::optional<std::string> answer = tools::answer_for_tools(*app_, count, words, {})) {
     std::fputs(answer->c_str(), stdout);
     return false;
   }
   try {
-    app_.parse(tools::marked_words(count, words));
+    app_->parse(tools::marked_words(count, words));
   } catch (const CLI::ParseError& error) {
-    if (error.get_exit_code() != 0) throw Failure{kUsage, tools::complaint(app_, error)};
-    app_.exit(error);
+    if (error.get_exit_code() != 0) throw Failure{kUsage, tools::complaint(*app_, error)};
+    app_->exit(error);
     return false;
   }
-  tools::use_device_root(app_.count("--root") > 0 ? std::optional(root_) : std::nullopt, kConfiguration);
+  tools::use_device_root(tools::is_given(*app_, "--root") ? std::optional(root_) : std::nullopt, kConfiguration);
   return true;
 }
 

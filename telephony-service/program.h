@@ -1,10 +1,10 @@
 // Everything around the socket that programs which serve it have in common: words, signals, exit statuses.
 #pragma once
 
-#include <CLI/CLI.hpp>
+#include <memory>
 #include <string>
 
-#include "common/command_words.h"
+#include "common/command_line.h"
 #include "linux/base/local_socket.h"
 #include "platform/descriptor.h"
 
@@ -21,15 +21,16 @@ inline constexpr int kConfiguration = 78;
 class CallWords {
  public:
   explicit CallWords(const tools::CommandWords& words);
+  ~CallWords();
 
   /// For the program's own options.
-  [[nodiscard]] CLI::App& app() noexcept { return app_; }
+  [[nodiscard]] CLI::App& app() noexcept { return *app_; }
   /// Takes the words of a call, and the device root that they name for everything that follows. False when the call
   /// asked for a text alone, which is printed then. Throws tools::Failure.
   [[nodiscard]] bool take(int count, char** words);
 
  private:
-  CLI::App app_;
+  std::unique_ptr<CLI::App> app_;
   std::string root_;
 };
 

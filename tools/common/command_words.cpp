@@ -35,12 +35,8 @@ std::string reason(const CLI::App& app, const CLI::ParseError& error) {
 
 }  // namespace
 
-CLI::App* add_command(CLI::App& parent, const CommandWords& words) {
-  CLI::App* command =
-      parent.add_subcommand(words.name, words.summary + (words.about.empty() ? "" : kAboutMark + words.about));
-  command->fallthrough();
-  command->footer(words.examples);
-  return command;
+std::string description_of(const CommandWords& words) {
+  return words.about.empty() ? words.summary : words.summary + kAboutMark + words.about;
 }
 
 const CLI::App& chosen_command(const CLI::App& app) {

@@ -1,25 +1,19 @@
-// The words of a command line, written once, where a command is added: from them come the help, the completions and
-// the man page's list of commands.
+// What a command line was made of, read back from its parser, and what is wrong with the words of a call.
 //
-// A command's description is its summary, one sentence without a full stop, and what there is to say about it, if
-// anything, behind an empty line. Its footer is its examples.
+// A command's description is its summary and what there is to say about it, if anything, behind an empty line. Its
+// footer is its examples.
 #pragma once
 
 #include <CLI/CLI.hpp>
 #include <string>
 #include <vector>
 
+#include "command_line.h"
+
 namespace quorvel::tools {
 
-struct CommandWords {
-  std::string name;
-  std::string summary;
-  std::string examples;    // lines of at most 78 columns; empty: none
-  std::string about = {};  // whole sentences; empty lines part paragraphs
-};
-
-CLI::App* add_command(CLI::App& parent, const CommandWords& words);
-
+/// Summary and more as one description, from which the next two take them.
+[[nodiscard]] std::string description_of(const CommandWords& words);
 [[nodiscard]] std::string summary_of(const CLI::App& command);
 [[nodiscard]] std::string about_of(const CLI::App& command);
 

@@ -19,7 +19,7 @@ const CLI::Option* find_option(const CLI::App* command, const std::string& name)
 // Follows the words of a call as the parser would.
 class Walk {
  public:
-  explicit Walk(const CLI::App& program) : call_{&program, {}, {}} {}
+  explicit Walk(const CLI::App& program) : command_(&program) {}
 
   void take(const std::string& word) {
     if (pending_ != nullptr) {
@@ -38,25 +38,28 @@ class Walk {
   [[nodiscard]] UnfinishedCall at(std::string& typed) {
     const std::size_t equals = typed.find('=');
     if (pending_ == nullptr && !only_words_ && typed.starts_with("--") && equals != std::string::npos) {
-      pending_ = find_option(call_.command, typed.substr(0, equals));
+      pending_ = find_option(command_, typed.substr(0, equals));
       typed.erase(0, equals + 1);
       if (pending_ == nullptr) call_.value = "-";
     }
     if (pending_ != nullptr) {
       call_.value = value_name(*pending_);
-    } else if (!offers_options(typed) && commands_of(*call_.command).empty()) {
+    } else if (!offers_options(typed) && commands_of(*command_).empty()) {
       const CLI::Option* word = next_positional();
       call_.value = word == nullptr ? "-" : value_name(*word);
     }
+    call_.command = full_name(*command_);
     return call_;
   }
+
+  [[nodiscard]] const CLI::App& command() const { return *command_; }
 
   [[nodiscard]] bool offers_options(const std::string& typed) const { return !only_words_ && typed.starts_with('-'); }
 
  private:
   void take_option(const std::string& word) {
     const std::size_t equals = word.find('=');
-    const CLI::Option* option = find_option(call_.command, word.substr(0, equals));
+    const CLI::Option* option = find_option(command_, word.substr(0, equals));
     if (option == nullptr) return;
     if (equals != std::string::npos) {
       call_.given[long_name(*option)] = word.substr(equals + 1);
@@ -68,9 +71,9 @@ class Walk {
   }
 
   void take_positional(const std::string& word) {
-    for (const CLI::App* below : commands_of(*call_.command)) {
+    for (const CLI::App* below : commands_of(*command_)) {
       if (below->get_name() != word) continue;
-      call_.command = below;
+      command_ = below;
       return;
     }
     if (const CLI::Option* option = next_positional()) call_.given[long_name(*option)] = word;
@@ -78,22 +81,23 @@ class Walk {
   }
 
   [[nodiscard]] const CLI::Option* next_positional() const {
-    const std::vector<const CLI::Option*> words = positionals_of(*call_.command);
+    const std::vector<const CLI::Option*> words = positionals_of(*command_);
     if (positionals_ < words.size()) return words[positionals_];
     return !words.empty() && takes_many(*words.back()) ? words.back() : nullptr;
   }
 
+  const CLI::App* command_;
   UnfinishedCall call_;
   const CLI::Option* pending_ = nullptr;
   bool only_words_ = false;
   std::size_t positionals_ = 0;
 };
 
-std::vector<Candidate> options_at(const UnfinishedCall& call) {
+std::vector<Candidate> options_for(const CLI::App& chosen, const UnfinishedCall& call) {
   std::vector<Candidate> options{{"--help", "Print the help and end"}};
-  for (const CLI::App* command = call.command; command != nullptr; command = command->get_parent()) {
+  for (const CLI::App* command = &chosen; command != nullptr; command = command->get_parent()) {
     for (const CLI::Option* option : options_of(*command)) {
-      const bool only_alone = long_name(*option) == "--version" && command != call.command;
+      const bool only_alone = long_name(*option) == "--version" && command != &chosen;
       if (only_alone || call.given.contains(long_name(*option))) continue;
       options.push_back({long_name(*option), option->get_description()});
     }
@@ -101,9 +105,9 @@ std::vector<Candidate> options_at(const UnfinishedCall& call) {
   return options;
 }
 
-std::vector<Candidate> commands_at(const UnfinishedCall& call) {
+std::vector<Candidate> commands_below(const CLI::App& chosen) {
   std::vector<Candidate> commands;
-  for (const CLI::App* below : commands_of(*call.command)) commands.push_back({below->get_name(), summary_of(*below)});
+  for (const CLI::App* below : commands_of(chosen)) commands.push_back({below->get_name(), summary_of(*below)});
   return commands;
 }
 
@@ -118,8 +122,8 @@ std::string complete(const CLI::App& program, const std::vector<std::string>& wo
   if (call.value == "FILE") return ":file\n";
   const auto known = [&](const UnfinishedCall& at) { return candidates ? candidates(at) : std::vector<Candidate>(); };
   const std::vector<Candidate> found = !call.value.empty()          ? known(call)
-                                       : walk.offers_options(typed) ? options_at(call)
-                                                                    : commands_at(call);
+                                       : walk.offers_options(typed) ? options_for(walk.command(), call)
+                                                                    : commands_below(walk.command());
   std::string lines;
   for (const Candidate& candidate : found) {
     // A text that a terminal must not see cannot be offered.

@@ -1,12 +1,15 @@
 // What can stand next in an unfinished call: the shells' completions ask the program itself.
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <functional>
 #include <map>
 #include <optional>
 #include <string>
 #include <vector>
+
+namespace CLI {
+class App;
+}
 
 namespace quorvel::tools {
 
@@ -17,7 +20,7 @@ struct Candidate {
 
 /// An unfinished call up to the value that is being typed.
 struct UnfinishedCall {
-  const CLI::App* command;
+  std::string command;                       // the command's full name, such as "quorvelctl ark get"
   std::string value;                         // the name of the value, such as KEY
   std::map<std::string, std::string> given;  // values so far, by the option's long name or the word's name
 };

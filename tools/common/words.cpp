@@ -21,13 +21,4 @@ std::vector<std::string> marked_words(int count, char** words) {
   return marked;
 }
 
-CLI::Option* add_word(CLI::App& command, const std::string& name, std::string& word, const std::string& help) {
-  const auto take = [&word](const CLI::results_t& results) {
-    word = results.front();
-    if (word.starts_with(kMark)) word.erase(0, 1);
-    return true;
-  };
-  return command.add_option(name, take, help)->type_name("");
-}
-
 }  // namespace quorvel::tools

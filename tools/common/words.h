@@ -4,7 +4,6 @@
 // words are marked before parsing, and the mark is taken off as the parser hands them out.
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <string>
 #include <vector>
 
@@ -15,8 +14,5 @@ inline constexpr char kMark = '\x01';
 
 /// The words of the call, in the parser's order (the last one first), marked where needed.
 [[nodiscard]] std::vector<std::string> marked_words(int count, char** words);
-
-/// A positional word or an option's value, taken as it stands.
-CLI::Option* add_word(CLI::App& command, const std::string& name, std::string& word, const std::string& help);
 
 }  // namespace quorvel::tools

@@ -1,10 +1,12 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <memory>
+#include <optional>
+#include <utility>
 
 #include "commands.h"
 #include "common/human_text.h"
-#include "common/words.h"
 #include "files.h"
 #include "live_answer.h"
 #include "output.h"
@@ -117,43 +119,41 @@ int get_key(const ArkWords& words, const Form& form) {
 }
 
 void add_domain(CLI::App& command, ArkWords& words) {
-  add_word(command, "--domain", words.domain, "The domain; without it, entries that have none")->option_text("DOMAIN");
+  add_option(command, "--domain", words.domain, "DOMAIN", "The domain; without it, entries that have none");
 }
 
 }  // namespace
 
 void add_ark(CLI::App& app, CommandLine& line) {
-  CLI::App* ark = add_command(app, {"ark", "Read the saved data ark, without the daemon",
-                                    "  quorvelctl ark list --all\n"
-                                    "  quorvelctl ark get ProductVersion\n"
-                                    "  quorvelctl ark get --domain com.Orvane.mobile.battery \\\n"
-                                    "    BatteryIsCharging"});
-  ark->require_subcommand(1);
+  CLI::App& ark = add_group(app, {"ark", "Read the saved data ark, without the daemon",
+                                  "  quorvelctl ark list --all\n"
+                                  "  quorvelctl ark get ProductVersion\n"
+                                  "  quorvelctl ark get --domain com.Orvane.mobile.battery \\\n"
+                                  "    BatteryIsCharging"});
   auto words = std::make_shared<ArkWords>();
 
-  CLI::App* list =
-      add_command(*ark, {"list", "Print a domain's saved entries",
-                         "  quorvelctl ark list --domain com.example.settings --json\n"
-                         "  quorvelctl ark list --domains",
-                         "The daemon saves its entries once, at its start, and removes the file when there "
-                         "is nothing to save: what a running daemon holds may differ. Keys that are "
-                         "answered live are never saved; see quorvelctl facts."});
-  add_domain(*list, *words);
-  list->add_flag("--all", words->all, "Every entry, by domain");
-  list->add_flag("--domains", words->domains, "The names of the domains that have entries");
-  list->callback([&line, words, list] {
-    words->has_domain = list->count("--domain") > 0;
+  CLI::App& list = add_command(ark, {"list", "Print a domain's saved entries",
+                                     "  quorvelctl ark list --domain com.example.settings --json\n"
+                                     "  quorvelctl ark list --domains",
+                                     "The daemon saves its entries once, at its start, and removes the file when there "
+                                     "is nothing to save: what a running daemon holds may differ. Keys that are "
+                                     "answered live are never saved; see quorvelctl facts."});
+  add_domain(list, *words);
+  add_switch(list, "--all", words->all, "Every entry, by domain");
+  add_switch(list, "--domains", words->domains, "The names of the domains that have entries");
+  when_chosen(list, [&line, words, &list] {
+    words->has_domain = is_given(list, "--domain");
     line.run = [&line, words] { return list_entries(*words, line.json); };
   });
 
-  CLI::App* get = add_command(*ark, {"get", "Print one key, live from the device where the daemon would ask it",
-                                     "  quorvelctl ark get PreviousSIMStatus\n"
-                                     "  quorvelctl ark get --raw SerialNumber"});
-  add_domain(*get, *words);
-  add_raw(*get, words->raw);
-  add_word(*get, "KEY", words->key, "The key")->required();
-  get->callback([&line, words, get] {
-    words->has_domain = get->count("--domain") > 0;
+  CLI::App& get = add_command(ark, {"get", "Print one key, live from the device where the daemon would ask it",
+                                    "  quorvelctl ark get PreviousSIMStatus\n"
+                                    "  quorvelctl ark get --raw SerialNumber"});
+  add_domain(get, *words);
+  add_raw(get, words->raw);
+  add_word(get, "KEY", words->key, "The key");
+  when_chosen(get, [&line, words, &get] {
+    words->has_domain = is_given(get, "--domain");
     line.run = [&line, words] { return get_key(*words, {line.json, words->raw}); };
   });
 }

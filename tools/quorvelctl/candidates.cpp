@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <memory>
 
 #include "commands.h"
 #include "files.h"
@@ -82,7 +83,7 @@ std::vector<Candidate> ark_keys(const UnfinishedCall& call, bool every_domain) {
 
 std::vector<Candidate> telephony_fields(const std::string& command) {
   std::vector<Candidate> fields;
-  const bool errors = command == "fail" || command == "succeed";
+  const bool errors = command.ends_with(" fail") || command.ends_with(" succeed");
   for (const std::string_view name : wire::kStateFields) {
     if (name == (errors ? wire::kSimStatusField.text() : wire::kConnectionField.text())) continue;
     fields.push_back({std::string(name)});
@@ -91,12 +92,12 @@ std::vector<Candidate> telephony_fields(const std::string& command) {
 }
 
 std::vector<Candidate> known_values(const UnfinishedCall& call) {
-  const std::string command = full_name(*call.command);
+  const std::string& command = call.command;
   const bool preferences = command.starts_with("quorvelctl preferences");
   if (call.value == "DOMAIN" && preferences) return preference_domains();
   if (call.value == "DOMAIN" && command.starts_with("quorvelctl ark")) return ark_domains();
   if (call.value == "KEY") return preferences ? preference_keys(call) : ark_keys(call, command == "quorvelctl facts");
-  if (call.value == "FIELD") return telephony_fields(call.command->get_name());
+  if (call.value == "FIELD") return telephony_fields(command);
   std::vector<Candidate> names;
   if (call.value == "NAME") {
     for (const std::string_view name : wire::kTelephonyNotifications) names.push_back({std::string(name)});

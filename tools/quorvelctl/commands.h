@@ -2,11 +2,10 @@
 // leaves what it is to do in `CommandLine::run`.
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <functional>
 #include <string>
 
-#include "common/command_words.h"
+#include "common/command_line.h"
 #include "common/completion.h"
 #include "common/failure.h"
 

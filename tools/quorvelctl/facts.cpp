@@ -2,12 +2,13 @@
 
 #include <algorithm>
 #include <chrono>
+#include <memory>
 #include <thread>
+#include <utility>
 
 #include "commands.h"
 #include "common/human_text.h"
 #include "common/json.h"
-#include "common/words.h"
 #include "daemon_process.h"
 #include "facts_text.h"
 #include "live_answer.h"
@@ -110,7 +111,7 @@ int run_facts(const FactWords& words, bool json) {
 }  // namespace
 
 void add_facts(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(
+  CLI::App& command = add_command(
       app, {"facts", "Print what the device answers live, and from where",
             "  quorvelctl facts\n"
             "  quorvelctl facts SerialNumber HardwareModel\n"
@@ -121,11 +122,10 @@ void add_facts(CLI::App& app, CommandLine& line) {
             "answers in /etc/quorvel/device_information.plist win over everything.\n\n"
             "Exit status: 1 when nothing that was asked for has an answer."});
   auto words = std::make_shared<FactWords>();
-  command->add_flag("--all", words->all, "Also the keys without an answer");
-  add_word(*command, "--watch", words->seconds, "Ask again every so many seconds and print what changes")
-      ->option_text("SECONDS");
-  command->add_option("KEY", words->keys, "These keys only");
-  command->callback([&line, words] { line.run = [&line, words] { return run_facts(*words, line.json); }; });
+  add_switch(command, "--all", words->all, "Also the keys without an answer");
+  add_option(command, "--watch", words->seconds, "SECONDS", "Ask again every so many seconds and print what changes");
+  add_words(command, "KEY", words->keys, "These keys only");
+  when_chosen(command, [&line, words] { line.run = [&line, words] { return run_facts(*words, line.json); }; });
 }
 
 }  // namespace quorvel::tools

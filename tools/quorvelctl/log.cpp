@@ -1,11 +1,13 @@
+#include <algorithm>
 #include <chrono>
 #include <deque>
+#include <memory>
 #include <thread>
+#include <utility>
 
 #include "commands.h"
 #include "common/human_text.h"
 #include "common/json.h"
-#include "common/words.h"
 #include "files.h"
 #include "log_files.h"
 #include "output.h"
@@ -115,13 +117,13 @@ int print_log(const LogWords& words, bool json) {
 }  // namespace
 
 void add_log(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, {"log", "Print the daemon's log, the previous generation first",
+  CLI::App& command = add_command(app, {"log", "Print the daemon's log, the previous generation first",
                                         "  quorvelctl log -n 20\n"
                                         "  quorvelctl log --follow -n 0"});
   auto words = std::make_shared<LogWords>();
-  command->add_flag("-f,--follow", words->follow, "Go on printing what is logged, until interrupted");
-  add_word(*command, "-n,--lines", words->count, "Of what is there, print the last N lines only")->option_text("N");
-  command->callback([&line, words] { line.run = [&line, words] { return print_log(*words, line.json); }; });
+  add_switch(command, "-f,--follow", words->follow, "Go on printing what is logged, until interrupted");
+  add_option(command, "-n,--lines", words->count, "N", "Of what is there, print the last N lines only");
+  when_chosen(command, [&line, words] { line.run = [&line, words] { return print_log(*words, line.json); }; });
 }
 
 }  // namespace quorvel::tools

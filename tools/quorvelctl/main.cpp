@@ -1,6 +1,9 @@
+#include <memory>
 #include <new>
+#include <optional>
 
 #include "commands.h"
+#include "common/command_words.h"
 #include "common/help_text.h"
 #include "common/root_option.h"
 #include "common/words.h"
@@ -31,8 +34,8 @@ void add_commands(CLI::App& app, CommandLine& line) {
   app.footer(kExamples);
   app.require_subcommand(1);
   app.fallthrough();
-  add_word(app, "--root", line.root, kRootHelp)->option_text("DIR");
-  app.add_flag("--json", line.json, "Print JSON, for programs");
+  add_option(app, "--root", line.root, "DIR", kRootHelp);
+  add_switch(app, "--json", line.json, "Print JSON, for programs");
   app.set_version_flag("--version", "quorvelctl " QUORVEL_VERSION, "Print the version and end");
   add_status(app, line);
   add_regulatory_images(app, line);
@@ -66,7 +69,7 @@ int parse_and_run(int count, char** words) {
     throw Failure{kWrongWords, complaint(app, error)};
   }
   // An empty word, as of a variable that is not set, is no way to ask for the machine's own root.
-  const bool chosen = app.count("--root") > 0;
+  const bool chosen = is_given(app, "--root");
   if (line.uses_root) use_device_root(chosen ? std::optional(line.root) : std::nullopt, kWrongWords);
   return line.run();
 }

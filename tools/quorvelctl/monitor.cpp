@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdio>
+#include <memory>
 #include <thread>
 
 #include "client_failure.h"
@@ -9,7 +10,6 @@
 #include "common/date_text.h"
 #include "common/human_text.h"
 #include "common/json.h"
-#include "common/words.h"
 #include "output.h"
 #include "quorvel/observer.h"
 
@@ -91,7 +91,7 @@ int run_monitor(const MonitorWords& words, bool json) {
 }  // namespace
 
 void add_monitor(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(
+  CLI::App& command = add_command(
       app, {"monitor", "Print each posted notification as it arrives",
             "  quorvelctl monitor\n"
             "  quorvelctl monitor --count 1 --name 'com.example.*'\n"
@@ -99,10 +99,10 @@ void add_monitor(CLI::App& app, CommandLine& line) {
             "Goes on until it is interrupted, also when the daemon ends and is started again. A reader that "
             "is too slow is told how many notifications it missed."});
   auto words = std::make_shared<MonitorWords>();
-  add_word(*command, "--name", words->name, "Only notifications of this name, in which * and ? stand for others")
-      ->option_text("PATTERN");
-  add_word(*command, "--count", words->count, "End after N notifications")->option_text("N");
-  command->callback([&line, words] { line.run = [&line, words] { return run_monitor(*words, line.json); }; });
+  add_option(command, "--name", words->name, "PATTERN",
+             "Only notifications of this name, in which * and ? stand for others");
+  add_option(command, "--count", words->count, "N", "End after N notifications");
+  when_chosen(command, [&line, words] { line.run = [&line, words] { return run_monitor(*words, line.json); }; });
 }
 
 }  // namespace quorvel::tools

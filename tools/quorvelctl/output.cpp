@@ -8,6 +8,7 @@
 #include <csignal>
 #include <cstring>
 
+#include "common/command_line.h"
 #include "common/failure.h"
 #include "common/human_text.h"
 #include "common/json.h"
@@ -31,7 +32,7 @@ int print_value(const PropertyValue& value, bool json) {
 }
 
 void add_raw(CLI::App& command, bool& raw) {
-  command.add_flag("--raw", raw, "Print a text without escapes and data as its bytes, for a file or a pipe");
+  add_switch(command, "--raw", raw, "Print a text without escapes and data as its bytes, for a file or a pipe");
 }
 
 int print_value(const PropertyValue& value, const Form& form) {

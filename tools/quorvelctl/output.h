@@ -1,12 +1,16 @@
 // What goes to standard output: the value asked for and nothing else. Everything else goes to standard error.
 #pragma once
 
-#include <CLI/CLI.hpp>
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "property/value.h"
+
+namespace CLI {
+class App;
+}
 
 namespace quorvel::tools {
 

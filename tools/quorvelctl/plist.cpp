@@ -5,9 +5,9 @@
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
+#include <memory>
 
 #include "commands.h"
-#include "common/words.h"
 #include "files.h"
 #include "output.h"
 #include "platform/descriptor.h"
@@ -79,27 +79,26 @@ int write_plist(const std::string& path, bool json) {
 }  // namespace
 
 void add_plist(CLI::App& app, CommandLine& line) {
-  CLI::App* plist =
-      add_command(app, {"plist", "Show and write property-list files",
-                        "  quorvelctl plist show images.plist\n"
-                        "  echo '{\"Label\": {\"$data\": \"AAEC\"}}' | quorvelctl plist write images.plist\n"
-                        "  quorvelctl plist show a.plist --json | quorvelctl plist write b.plist\n\n"
-                        "FILE is an ordinary path; the device root does not count here."});
-  plist->require_subcommand(1);
+  CLI::App& plist =
+      add_group(app, {"plist", "Show and write property-list files",
+                      "  quorvelctl plist show images.plist\n"
+                      "  echo '{\"Label\": {\"$data\": \"AAEC\"}}' | quorvelctl plist write images.plist\n"
+                      "  quorvelctl plist show a.plist --json | quorvelctl plist write b.plist\n\n"
+                      "FILE is an ordinary path; the device root does not count here."});
   auto file = std::make_shared<std::string>();
-  CLI::App* show =
-      add_command(*plist, {"show", "Print a property-list file", "  quorvelctl plist show --json images.plist"});
-  add_word(*show, "FILE", *file, "The file; - is standard input")->required();
-  show->callback([&line, file] {
+  CLI::App& show =
+      add_command(plist, {"show", "Print a property-list file", "  quorvelctl plist show --json images.plist"});
+  add_word(show, "FILE", *file, "The file; - is standard input");
+  when_chosen(show, [&line, file] {
     line.uses_root = false;
     line.run = [&line, file] { return show_file(*file, line.json); };
   });
 
-  CLI::App* write =
-      add_command(*plist, {"write", "Write a property-list file from the JSON on standard input",
-                           R"(  echo '[1, true, {"$date": "2026-01-31T12:00:00Z"}]' | quorvelctl plist write -)"});
-  add_word(*write, "FILE", *file, "The file, replaced as a whole; - is standard output")->required();
-  write->callback([&line, file] {
+  CLI::App& write =
+      add_command(plist, {"write", "Write a property-list file from the JSON on standard input",
+                          R"(  echo '[1, true, {"$date": "2026-01-31T12:00:00Z"}]' | quorvelctl plist write -)"});
+  add_word(write, "FILE", *file, "The file, replaced as a whole; - is standard output");
+  when_chosen(write, [&line, file] {
     line.uses_root = false;
     line.run = [&line, file] { return write_plist(*file, line.json); };
   });

@@ -5,11 +5,12 @@
 
 #include <cerrno>
 #include <chrono>
+#include <memory>
+#include <optional>
 #include <thread>
 
 #include "commands.h"
 #include "common/human_text.h"
-#include "common/words.h"
 #include "files.h"
 #include "output.h"
 #include "platform/descriptor.h"
@@ -144,31 +145,30 @@ int delete_preference(const PreferenceWords& words, const Form& form) {
 }  // namespace
 
 void add_preferences(CLI::App& app, CommandLine& line) {
-  CLI::App* preferences =
-      add_command(app, {"preferences", "Show and change the preferences store",
-                        "  quorvelctl preferences list com.Orvane.quorveld\n"
-                        "  quorvelctl preferences set com.Orvane.quorveld ExtLogging 1\n"
-                        "  quorvelctl preferences delete com.Orvane.quorveld ExtLogging\n\n"
-                        "The daemon reads its own preferences when it starts: restart it after a change."});
-  preferences->require_subcommand(1);
+  CLI::App& preferences =
+      add_group(app, {"preferences", "Show and change the preferences store",
+                      "  quorvelctl preferences list com.Orvane.quorveld\n"
+                      "  quorvelctl preferences set com.Orvane.quorveld ExtLogging 1\n"
+                      "  quorvelctl preferences delete com.Orvane.quorveld ExtLogging\n\n"
+                      "The daemon reads its own preferences when it starts: restart it after a change."});
   auto words = std::make_shared<PreferenceWords>();
-  const auto add = [&](const char* name, const char* summary, const char* example, bool key, auto run) {
-    CLI::App* command = add_command(*preferences, {name, summary, example});
-    add_word(*command, "DOMAIN", words->domain, "Reverse-DNS name, such as com.Orvane.quorveld")->required();
-    if (key) add_word(*command, "KEY", words->key, "The key")->required();
-    command->callback([&line, words, run] {
+  const auto add = [&](const char* name, const char* summary, const char* example, bool key, auto run) -> CLI::App& {
+    CLI::App& command = add_command(preferences, {name, summary, example});
+    add_word(command, "DOMAIN", words->domain, "Reverse-DNS name, such as com.Orvane.quorveld");
+    if (key) add_word(command, "KEY", words->key, "The key");
+    when_chosen(command, [&line, words, run] {
       line.run = [&line, words, run] { return run(*words, Form{line.json, words->raw}); };
     });
     return command;
   };
   add("list", "Print all of a domain", "  quorvelctl preferences list com.Orvane.quorveld --json", false,
       list_preferences);
-  CLI::App* get = add("get", "Print one value", "  quorvelctl preferences get com.Orvane.quorveld MachineHack", true,
+  CLI::App& get = add("get", "Print one value", "  quorvelctl preferences get com.Orvane.quorveld MachineHack", true,
                       get_preference);
-  add_raw(*get, words->raw);
-  CLI::App* set = add("set", "Set one value", "  quorvelctl preferences set com.Orvane.quorveld MachineHack '\"q35\"'",
+  add_raw(get, words->raw);
+  CLI::App& set = add("set", "Set one value", "  quorvelctl preferences set com.Orvane.quorveld MachineHack '\"q35\"'",
                       true, set_preference);
-  add_word(*set, "JSON", words->json, "The value as JSON; a text needs its double quotes: '\"text\"'")->required();
+  add_word(set, "JSON", words->json, "The value as JSON; a text needs its double quotes: '\"text\"'");
   add("delete", "Take one value away", "  quorvelctl preferences delete com.Orvane.quorveld MachineHack", true,
       delete_preference);
 }

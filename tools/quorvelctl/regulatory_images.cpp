@@ -1,3 +1,5 @@
+#include <optional>
+
 #include "client_failure.h"
 #include "commands.h"
 #include "files.h"
@@ -24,10 +26,10 @@ std::string why_none() {
 }  // namespace
 
 void add_regulatory_images(CLI::App& app, CommandLine& line) {
-  CLI::App* command = add_command(app, {"regulatory-images", "Ask the daemon for the regulatory images and print them",
+  CLI::App& command = add_command(app, {"regulatory-images", "Ask the daemon for the regulatory images and print them",
                                         "  quorvelctl regulatory-images\n"
                                         "  quorvelctl --root /tmp/device regulatory-images --json"});
-  command->callback([&line] {
+  when_chosen(command, [&line] {
     line.run = [&line] {
       const client::Reply reply = client::Client().copy_regulatory_images();
       if (reply.error) throw unreachable(*reply.error, "the daemon", "quorveld");

@@ -5,10 +5,11 @@
 #include <algorithm>
 #include <cerrno>
 #include <filesystem>
+#include <memory>
+#include <utility>
 
 #include "commands.h"
 #include "common/human_text.h"
-#include "common/words.h"
 #include "files.h"
 #include "output.h"
 #include "platform/descriptor.h"
@@ -133,16 +134,15 @@ int create_root(const std::string& path, bool json) {
 }  // namespace
 
 void add_root(CLI::App& app, CommandLine& line) {
-  CLI::App* root = add_command(app, {"root", "Make a device root, a directory that stands for the device's /",
-                                     "  quorvelctl root create /tmp/device"});
-  root->require_subcommand(1);
-  CLI::App* create = add_command(*root, {"create", "Make a device root; what is there already stays as it is",
-                                         "  quorvelctl root create /tmp/device\n"
-                                         "  export QUORVEL_ROOT=/tmp/device\n"
-                                         "  telvane-sim & quorveld & quorvelctl log --follow"});
+  CLI::App& root = add_group(app, {"root", "Make a device root, a directory that stands for the device's /",
+                                   "  quorvelctl root create /tmp/device"});
+  CLI::App& create = add_command(root, {"create", "Make a device root; what is there already stays as it is",
+                                        "  quorvelctl root create /tmp/device\n"
+                                        "  export QUORVEL_ROOT=/tmp/device\n"
+                                        "  telvane-sim & quorveld & quorvelctl log --follow"});
   auto directory = std::make_shared<std::string>();
-  add_word(*create, "DIR", *directory, "The directory, made when it is missing")->required();
-  create->callback([&line, directory] {
+  add_word(create, "DIR", *directory, "The directory, made when it is missing");
+  when_chosen(create, [&line, directory] {
     line.uses_root = false;
     line.run = [&line, directory] { return create_root(*directory, line.json); };
   });

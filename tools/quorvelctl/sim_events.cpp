@@ -1,7 +1,6 @@
 // What the simulator tells: notifications, a card that goes in or out, and a record of all that a service tells.
 #include <cstdint>
 
-#include "common/words.h"
 #include "output.h"
 #include "sim_calls.h"
 #include "sim_record.h"
@@ -50,21 +49,21 @@ int eject_sim(const SimWords&, bool json) {
 }  // namespace
 
 void add_event_commands(CLI::App& sim, CommandLine& line, const Words& words) {
-  CLI::App* send = add_sim_command(sim, line, words,
+  CLI::App& send = add_sim_command(sim, line, words,
                                    {"notify", "Send a notification with the state to everybody who observes",
                                     "  quorvelctl sim notify sim-status-changed\n"
                                     "  quorvelctl sim notify --count 1000 phone-number-changed"},
                                    send_notification);
-  add_word(*send, "NAME", words->name, "One of " + list_of(wire::kTelephonyNotifications, " and "))->required();
-  add_word(*send, "--count", words->count, "Send it N times")->option_text("N");
-  CLI::App* insert = add_sim_command(sim, line, words,
+  add_word(send, "NAME", words->name, "One of " + list_of(wire::kTelephonyNotifications, " and "));
+  add_option(send, "--count", words->count, "N", "Send it N times");
+  CLI::App& insert = add_sim_command(sim, line, words,
                                      {"insert", "Insert a SIM: set its fields, then send the notifications",
                                       "  quorvelctl sim insert --iccid 8944501234567890123 \\\n"
                                       "    --imsi 234150999999999"},
                                      insert_sim);
-  add_word(*insert, "--iccid", words->iccid, "The card's identity")->required()->option_text("S");
-  add_word(*insert, "--imsi", words->imsi, "The subscriber's identity")->required()->option_text("S");
-  CLI::App* record = add_sim_command(
+  add_option(insert, "--iccid", words->iccid, "S", "The card's identity", Need::kRequired);
+  add_option(insert, "--imsi", words->imsi, "S", "The subscriber's identity", Need::kRequired);
+  CLI::App& record = add_sim_command(
       sim, line, words,
       {"record", "Write down what a telephony service tells, until interrupted",
        "  quorvelctl sim record modem.jsonl\n"
@@ -72,7 +71,7 @@ void add_event_commands(CLI::App& sim, CommandLine& line, const Words& words) {
        "Follows the service as the daemon does, the simulator or a real one, and writes a line of JSON for each state "
        "and event with its time: {\"time\": ..., \"event\": NAME, \"state\": {...}}. The simulator plays them again."},
       [](const SimWords& given, bool) { return record_service(given.file); });
-  add_word(*record, "FILE", words->file, "The file, written anew; - is standard output")->required();
+  add_word(record, "FILE", words->file, "The file, written anew; - is standard output");
   add_sim_command(sim, line, words, {"eject", "Take the SIM out, and send the notification", "  quorvelctl sim eject"},
                   eject_sim);
 }

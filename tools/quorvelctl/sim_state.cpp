@@ -4,7 +4,6 @@
 
 #include "common/human_text.h"
 #include "common/json.h"
-#include "common/words.h"
 #include "output.h"
 #include "sim_calls.h"
 #include "sim_words.h"
@@ -86,7 +85,7 @@ int succeed_query(const SimWords& words, bool json) {
 }
 
 void add_field(CLI::App& command, const Words& words) {
-  add_word(command, "FIELD", words->field, "One of " + list_of(wire::kStateFields, " and "))->required();
+  add_word(command, "FIELD", words->field, "One of " + list_of(wire::kStateFields, " and "));
 }
 
 }  // namespace
@@ -94,28 +93,28 @@ void add_field(CLI::App& command, const Words& words) {
 void add_state_commands(CLI::App& sim, CommandLine& line, const Words& words) {
   add_sim_command(sim, line, words,
                   {"show", "Print the telephony service's present state", "  quorvelctl sim show --json"}, show_state);
-  CLI::App* set = add_sim_command(sim, line, words,
+  CLI::App& set = add_sim_command(sim, line, words,
                                   {"set", "Give a query a value; nobody is notified",
                                    "  quorvelctl sim set gid1 '\"A1\"'\n"
                                    "  quorvelctl sim set postponement \\\n"
                                    "    '{\"Status\": \"Ready\", \"Carrier\": \"Sample\"}'"},
                                   set_value);
-  add_field(*set, words);
-  add_word(*set, "JSON", words->json, "The value as JSON; a text needs its double quotes: '\"text\"'")->required();
-  add_field(*add_sim_command(sim, line, words, {"clear", "Take a query's value away", "  quorvelctl sim clear gid1"},
-                             clear_value),
+  add_field(set, words);
+  add_word(set, "JSON", words->json, "The value as JSON; a text needs its double quotes: '\"text\"'");
+  add_field(add_sim_command(sim, line, words, {"clear", "Take a query's value away", "  quorvelctl sim clear gid1"},
+                            clear_value),
             words);
-  CLI::App* fail = add_sim_command(sim, line, words,
+  CLI::App& fail = add_sim_command(sim, line, words,
                                    {"fail", "Make a query answer an error pair, beside its value",
                                     "  quorvelctl sim fail imsi 1 -5\n"
                                     "  quorvelctl sim fail connection 1 1"},
                                    fail_query);
-  add_field(*fail, words);
-  add_word(*fail, "DOMAIN", words->domain, "The error's domain, a 32-bit integer")->required();
-  add_word(*fail, "CODE", words->code, "The error's code, a 32-bit integer; 0 is no failure")->required();
+  add_field(fail, words);
+  add_word(fail, "DOMAIN", words->domain, "The error's domain, a 32-bit integer");
+  add_word(fail, "CODE", words->code, "The error's code, a 32-bit integer; 0 is no failure");
   add_field(
-      *add_sim_command(sim, line, words, {"succeed", "Take a query's error pair away", "  quorvelctl sim succeed imsi"},
-                       succeed_query),
+      add_sim_command(sim, line, words, {"succeed", "Take a query's error pair away", "  quorvelctl sim succeed imsi"},
+                      succeed_query),
       words);
 }
 

@@ -17,7 +17,7 @@ using Words = std::shared_ptr<SimWords>;
 using Run = int (*)(const SimWords&, bool json);
 
 /// Adds a command below `sim` that does what `run` does with the words.
-CLI::App* add_sim_command(CLI::App& sim, CommandLine& line, const Words& words, const CommandWords& own, Run run);
+CLI::App& add_sim_command(CLI::App& sim, CommandLine& line, const Words& words, const CommandWords& own, Run run);
 
 /// "a, b or c" of names, with `last` before the last one.
 template <typename Names>

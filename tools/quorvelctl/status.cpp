@@ -54,7 +54,7 @@ int print_status(bool json) {
 }  // namespace
 
 void add_status(CLI::App& app, CommandLine& line) {
-  CLI::App* command =
+  CLI::App& command =
       add_command(app, {"status", "Tell whether the daemon is there and all is well",
                         "  quorvelctl status\n"
                         "  quorvelctl status --json | jq .well",
@@ -62,7 +62,7 @@ void add_status(CLI::App& app, CommandLine& line) {
                         "ark and at the log. Some of it only root and the daemon's user can see.\n\n"
                         "Exit status: 0 all is well; 1 something is not, or cannot be seen; 3 the daemon "
                         "does not run."});
-  command->callback([&line] { line.run = [&line] { return print_status(line.json); }; });
+  when_chosen(command, [&line] { line.run = [&line] { return print_status(line.json); }; });
 }
 
 }  // namespace quorvel::tools

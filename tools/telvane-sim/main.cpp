@@ -1,9 +1,9 @@
 #include <charconv>
 #include <cstdio>
 
+#include "common/command_line.h"
 #include "common/failure.h"
 #include "common/recording.h"
-#include "common/words.h"
 #include "platform/process.h"
 #include "replay.h"
 #include "sim_state.h"
@@ -63,9 +63,9 @@ int run(int count, char** words) {
   telephony::CallWords call(kWords);
   std::string file;
   std::string speed;
-  add_word(call.app(), "--replay", file, "Play what quorvelctl sim record wrote, beginning with the first observer")
-      ->option_text("FILE");
-  add_word(call.app(), "--speed", speed, "Play N times as fast, such as 10 or 0.5")->option_text("N");
+  add_option(call.app(), "--replay", file, "FILE",
+             "Play what quorvelctl sim record wrote, beginning with the first observer");
+  add_option(call.app(), "--speed", speed, "N", "Play N times as fast, such as 10 or 0.5");
   if (!call.take(count, words)) return 0;
   const double times = speed.empty() ? 1 : speed_of(speed);
   serve(Replay(file.empty() ? std::vector<RecordedStep>() : read_recording(file, telephony::kNoInput), times));
