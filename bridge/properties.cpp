@@ -34,13 +34,21 @@ int take_bytes(sd_bus_message* message, std::string& bytes) {
 
 int take_texts(sd_bus_message* message, std::vector<std::string>& texts) {
   texts.clear();
-  int result = sd_bus_message_enter_container(message, 'a', "s");
-  const char* read = nullptr;
-  while (result >= 0 && (result = sd_bus_message_read_basic(message, 's', &read)) > 0) {
-    if (texts.size() < kMostNumbers && std::string_view(read).size() <= kLongestText) texts.emplace_back(read);
-  }
-  if (result >= 0) result = sd_bus_message_exit_container(message);
+  const int result = each_text(message, [&](std::string_view text) {
+    if (texts.size() < kMostNumbers && text.size() <= kLongestText) texts.emplace_back(text);
+  });
   return result < 0 ? result : 1;
+}
+
+// Goes through an array of dictionary entries of the type `entry`; `take` takes what one holds.
+int each_entry(sd_bus_message* message, const char* entry, const std::function<int()>& take) {
+  const std::string element = std::string("{") + entry + "}";
+  int result = sd_bus_message_enter_container(message, 'a', element.c_str());
+  while (result >= 0 && (result = sd_bus_message_enter_container(message, 'e', entry)) > 0) {
+    result = take();
+    if (result >= 0) result = sd_bus_message_exit_container(message);
+  }
+  return result < 0 ? result : sd_bus_message_exit_container(message);
 }
 
 CardLock lock_of(std::uint32_t number) {
@@ -68,19 +76,38 @@ bool is_modem_property(std::string_view name) {
 }
 
 int each_property(sd_bus_message* message, const TakeProperty& take) {
-  int result = sd_bus_message_enter_container(message, 'a', "{sv}");
-  while (result >= 0 && (result = sd_bus_message_enter_container(message, 'e', "sv")) > 0) {
+  return each_entry(message, "sv", [&] {
     const char* name = nullptr;
     const char* type = nullptr;
-    if ((result = sd_bus_message_read_basic(message, 's', &name)) < 0) return result;
-    if ((result = sd_bus_message_peek_type(message, nullptr, &type)) < 0) return result;
-    if (type == nullptr) return -EBADMSG;
-    if ((result = sd_bus_message_enter_container(message, 'v', type)) < 0) return result;
-    if ((result = take(name, type)) == 0) result = sd_bus_message_skip(message, type);
-    if (result < 0) return result;
-    if ((result = sd_bus_message_exit_container(message)) < 0) return result;
-    if ((result = sd_bus_message_exit_container(message)) < 0) return result;
-  }
+    int result = sd_bus_message_read_basic(message, 's', &name);
+    if (result >= 0) result = sd_bus_message_peek_type(message, nullptr, &type);
+    if (result >= 0 && type == nullptr) result = -EBADMSG;
+    if (result >= 0) result = sd_bus_message_enter_container(message, 'v', type);
+    if (result >= 0 && (result = take(name, type)) == 0) result = sd_bus_message_skip(message, type);
+    return result < 0 ? result : sd_bus_message_exit_container(message);
+  });
+}
+
+int each_interface(sd_bus_message* message, const TakeInterface& take) {
+  return each_entry(message, "sa{sv}", [&] {
+    const char* name = nullptr;
+    int result = sd_bus_message_read_basic(message, 's', &name);
+    if (result >= 0 && (result = take(name)) == 0) result = sd_bus_message_skip(message, "a{sv}");
+    return result;
+  });
+}
+
+int each_objects_interface(sd_bus_message* message, const TakeInterface& take) {
+  return each_entry(message, "oa{sa{sv}}", [&] {
+    const int result = sd_bus_message_skip(message, "o");
+    return result < 0 ? result : each_interface(message, take);
+  });
+}
+
+int each_text(sd_bus_message* message, const std::function<void(std::string_view text)>& take) {
+  int result = sd_bus_message_enter_container(message, 'a', "s");
+  const char* text = nullptr;
+  while (result >= 0 && (result = sd_bus_message_read_basic(message, 's', &text)) > 0) take(text);
   return result < 0 ? result : sd_bus_message_exit_container(message);
 }
 

@@ -26,12 +26,14 @@ struct Modem {
   std::string iccid, imsi, revision, imei;  ///< empty when unknown
   std::string gid1, gid2;                   ///< bytes; empty when there are none
   std::vector<std::string> numbers;
+  bool operator==(const Modem&) const = default;
 };
 
 struct Reading {
   Reach reach = Reach::not_running;
   std::vector<Modem> modems;
   int error = 0;  ///< errno of what failed, for `refused`
+  bool operator==(const Reading&) const = default;
 };
 
 }  // namespace quorvel::bridge

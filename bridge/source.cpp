@@ -1,5 +1,7 @@
 #include "bridge/source.h"
 
+#include <sys/ioctl.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
@@ -31,6 +33,7 @@ constexpr auto kLongestRetry = std::chrono::seconds(30);
 constexpr auto kFirstOpenDelay = std::chrono::milliseconds(100);
 constexpr auto kLongestOpenDelay = std::chrono::milliseconds(5000);
 constexpr std::size_t kMostModems = 32;
+constexpr int kMostMessages = 100;
 
 struct Unref {
   void operator()(sd_bus_message* message) const { sd_bus_message_unref(message); }
@@ -49,30 +52,24 @@ bool has_relevant_change(sd_bus_message* message) {
     found |= is_modem_property(name);
     return 0;
   });
-  if (found || result < 0 || sd_bus_message_enter_container(message, 'a', "s") < 0) return true;
-  const char* name = nullptr;
-  while (sd_bus_message_read_basic(message, 's', &name) > 0) found |= is_modem_property(name);
-  return found;
+  if (found || result < 0) return true;
+  return each_text(message, [&](std::string_view name) { found |= is_modem_property(name); }) < 0 || found;
 }
 
-// An interface of a modem that goes or comes matters only when it is the modem's own.
+// An interface of a modem that goes or comes matters only when it is the modem's own. A message that cannot be read
+// counts as if it were.
 bool names_modem(sd_bus_message* message, bool is_added) {
-  if (sd_bus_message_skip(message, "o") < 0) return true;
-  if (is_added) {
-    if (sd_bus_message_enter_container(message, 'a', "{sa{sv}}") < 0) return true;
-    while (sd_bus_message_enter_container(message, 'e', "sa{sv}") > 0) {
-      const char* name = nullptr;
-      if (sd_bus_message_read_basic(message, 's', &name) < 0 || std::string_view(name) == kModem) return true;
-      if (sd_bus_message_skip(message, "a{sv}") < 0 || sd_bus_message_exit_container(message) < 0) return true;
-    }
-    return false;
+  bool found = false;
+  int result = sd_bus_message_skip(message, "o");
+  if (result >= 0 && is_added) {
+    result = each_interface(message, [&](std::string_view name) {
+      found |= name == kModem;
+      return 0;
+    });
+  } else if (result >= 0) {
+    result = each_text(message, [&](std::string_view name) { found |= name == kModem; });
   }
-  if (sd_bus_message_enter_container(message, 'a', "s") < 0) return true;
-  const char* name = nullptr;
-  while (sd_bus_message_read_basic(message, 's', &name) > 0) {
-    if (std::string_view(name) == kModem) return true;
-  }
-  return false;
+  return found || result < 0;
 }
 
 bool is_relevant(sd_bus_message* message) {
@@ -102,6 +99,7 @@ std::string text_of(const sd_bus_error& error) {
 
 int ModemManagerSource::open() {
   int result = sd_bus_open_system(&bus_);
+  if (result >= 0) result = sd_bus_add_filter(bus_, nullptr, on_message, this);
   for (const char* match : kMatches) {
     if (result >= 0) result = sd_bus_add_match_async(bus_, nullptr, match, on_signal, nullptr, this);
   }
@@ -112,9 +110,10 @@ int ModemManagerSource::open() {
 void ModemManagerSource::close() {
   if (bus_ != nullptr) sd_bus_close_unref(bus_);
   bus_ = nullptr;
-  is_reading_ = false;
+  is_reading_ = is_mute_ = false;
   objects_call_ = 0;
   card_calls_.clear();
+  disturbed_.reset();
   read_at_.reset();
   first_signal_.reset();
 }
@@ -126,6 +125,14 @@ void ModemManagerSource::lose_bus(int error) {
   last_reach_ = Reach::bus_lost;
   open_at_ = Clock::now() + open_delay_;
   open_delay_ = std::min(open_delay_ * 2, kLongestOpenDelay);
+}
+
+// An answer that does not come may be behind a message that never ends, which only another connection gets round.
+void ModemManagerSource::connect_anew() {
+  const auto read_at = read_at_;
+  close();
+  if (const int result = open(); result < 0) return lose_bus(result);
+  read_at_ = read_at;
 }
 
 pollfd ModemManagerSource::wait() const {
@@ -146,13 +153,28 @@ std::optional<ModemManagerSource::Clock::time_point> ModemManagerSource::deadlin
   return result;
 }
 
+// Takes so many messages at most, because a bus that never stops talking keeps nobody from being served.
+int ModemManagerSource::process() {
+  int result = 1;
+  for (int turn = 0; turn < kMostMessages && bus_ != nullptr && result > 0; ++turn) {
+    int bytes = 0;
+    static_cast<void>(::ioctl(sd_bus_get_fd(bus_), FIONREAD, &bytes));
+    // Answers to calls do not count as messages, and while they are awaited their time limit is guard enough.
+    const bool is_watched = bytes > 0 && !is_reading_ && sd_bus_is_ready(bus_) > 0;
+    has_message_ = false;
+    result = sd_bus_process(bus_, nullptr);
+    // A message has begun, and may never end: a reading finds out.
+    if (is_watched && !has_message_) mark_stale();
+  }
+  return result;
+}
+
 std::optional<Reading> ModemManagerSource::serve() {
   if (bus_ == nullptr && Clock::now() >= open_at_) {
     if (const int result = open(); result < 0) lose_bus(result);
   }
-  int result = 1;
-  while (bus_ != nullptr && (result = sd_bus_process(bus_, nullptr)) > 0) continue;
-  if (result < 0) lose_bus(result);
+  if (const int result = process(); result < 0) lose_bus(result);
+  if (is_mute_) connect_anew();
   if (bus_ != nullptr && !is_reading_ && read_at_ && Clock::now() >= *read_at_) {
     if (const int started = start_reading(); started < 0) lose_bus(started);
   }
@@ -166,8 +188,13 @@ void ModemManagerSource::mark_stale() {
   is_stale_ = is_reading_;
 }
 
-int ModemManagerSource::on_signal(sd_bus_message* message, void* source, sd_bus_error*) {
-  if (is_relevant(message)) static_cast<ModemManagerSource*>(source)->mark_stale();
+int ModemManagerSource::on_signal(sd_bus_message* message, void* context, sd_bus_error* /*error*/) {
+  if (is_relevant(message)) static_cast<ModemManagerSource*>(context)->mark_stale();
+  return 0;
+}
+
+int ModemManagerSource::on_message(sd_bus_message* /*message*/, void* context, sd_bus_error* /*error*/) {
+  static_cast<ModemManagerSource*>(context)->has_message_ = true;
   return 0;
 }
 
@@ -193,7 +220,7 @@ int ModemManagerSource::call(sd_bus_message* message, sd_bus_message_handler_t a
   return result;
 }
 
-int ModemManagerSource::on_objects(sd_bus_message* message, void* context, sd_bus_error*) {
+int ModemManagerSource::on_objects(sd_bus_message* message, void* context, sd_bus_error* /*error*/) {
   auto& source = *static_cast<ModemManagerSource*>(context);
   if (serial_of_call(message) != source.objects_call_) return 0;
   source.objects_call_ = 0;
@@ -214,27 +241,15 @@ int ModemManagerSource::on_objects(sd_bus_message* message, void* context, sd_bu
 
 int ModemManagerSource::take_objects(sd_bus_message* message) {
   std::vector<std::string> cards;  // each modem's, empty for none
-  int result = sd_bus_message_enter_container(message, 'a', "{oa{sa{sv}}}");
-  while (result >= 0 && (result = sd_bus_message_enter_container(message, 'e', "oa{sa{sv}}")) > 0) {
-    if ((result = sd_bus_message_skip(message, "o")) < 0) return result;
-    if ((result = sd_bus_message_enter_container(message, 'a', "{sa{sv}}")) < 0) return result;
-    while ((result = sd_bus_message_enter_container(message, 'e', "sa{sv}")) > 0) {
-      const char* interface = nullptr;
-      if ((result = sd_bus_message_read_basic(message, 's', &interface)) < 0) return result;
-      if (std::string_view(interface) == kModem && reading_.modems.size() < kMostModems) {
-        Modem modem;
-        std::string card;
-        if ((result = take_modem(message, modem, card)) < 0) return result;
-        reading_.modems.push_back(std::move(modem));
-        cards.push_back(reading_.modems.back().has_card ? card : "");
-      } else if ((result = sd_bus_message_skip(message, "a{sv}")) < 0) {
-        return result;
-      }
-      if ((result = sd_bus_message_exit_container(message)) < 0) return result;
-    }
-    if (result < 0 || (result = sd_bus_message_exit_container(message)) < 0) return result;
-    if ((result = sd_bus_message_exit_container(message)) < 0) return result;
-  }
+  int result = each_objects_interface(message, [&](std::string_view interface) {
+    if (interface != kModem || reading_.modems.size() == kMostModems) return 0;
+    Modem modem;
+    std::string card;
+    const int taken = take_modem(message, modem, card);
+    cards.push_back(modem.has_card ? card : "");
+    reading_.modems.push_back(std::move(modem));
+    return taken < 0 ? taken : 1;
+  });
   for (std::size_t modem = 0; result >= 0 && modem < cards.size(); ++modem) {
     if (!cards[modem].empty()) result = ask_card(cards[modem], modem);
   }
@@ -252,7 +267,7 @@ int ModemManagerSource::ask_card(const std::string& path, std::size_t modem) {
   return result;
 }
 
-int ModemManagerSource::on_card(sd_bus_message* message, void* context, sd_bus_error*) {
+int ModemManagerSource::on_card(sd_bus_message* message, void* context, sd_bus_error* /*error*/) {
   auto& source = *static_cast<ModemManagerSource*>(context);
   const auto call = source.card_calls_.find(serial_of_call(message));
   if (call == source.card_calls_.end()) return 0;
@@ -274,6 +289,7 @@ void ModemManagerSource::fail_reading(const std::string& reason, int error) {
   objects_call_ = 0;
   card_calls_.clear();
   is_reading_ = false;
+  is_mute_ = error == ETIMEDOUT;
   if (is_stale_) return;
   say("cannot read ModemManager: " + reason);
   if (last_reach_ != Reach::running) complete_ = Reading{Reach::refused, {}, error};
@@ -281,12 +297,17 @@ void ModemManagerSource::fail_reading(const std::string& reason, int error) {
   retry_delay_ = std::min(retry_delay_ * 2, kLongestRetry);
 }
 
-// A signal that came meanwhile makes the answers worthless: they could mix two cards.
+// A signal that came meanwhile makes the answers worthless, for they could mix two cards; but not when the reading
+// before said the same, since then nothing moved between the two.
 void ModemManagerSource::finish_reading() {
   if (!card_calls_.empty()) return;
   is_reading_ = false;
   retry_delay_ = std::chrono::seconds(1);
-  if (is_stale_) return;
+  if (is_stale_ && disturbed_ != reading_) {
+    disturbed_ = std::move(reading_);
+    return;
+  }
+  disturbed_.reset();
   if (!said_.empty()) trouble_ = reading_.reach == Reach::running ? "ModemManager answers" : "the bus answers";
   said_.clear();
   last_reach_ = reading_.reach;

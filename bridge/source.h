@@ -33,13 +33,16 @@ class ModemManagerSource {
   [[nodiscard]] std::string take_trouble() { return std::exchange(trouble_, {}); }
 
  private:
-  static int on_signal(sd_bus_message* message, void* source, sd_bus_error* error);
-  static int on_objects(sd_bus_message* message, void* source, sd_bus_error* error);
-  static int on_card(sd_bus_message* message, void* source, sd_bus_error* error);
+  static int on_message(sd_bus_message* message, void* context, sd_bus_error* error);
+  static int on_signal(sd_bus_message* message, void* context, sd_bus_error* error);
+  static int on_objects(sd_bus_message* message, void* context, sd_bus_error* error);
+  static int on_card(sd_bus_message* message, void* context, sd_bus_error* error);
 
   [[nodiscard]] int open();
   void close();
   void lose_bus(int error);
+  void connect_anew();
+  [[nodiscard]] int process();
   void mark_stale();
   [[nodiscard]] int start_reading();
   [[nodiscard]] int take_objects(sd_bus_message* message);
@@ -53,12 +56,15 @@ class ModemManagerSource {
   Clock::time_point open_at_ = Clock::now();
   std::chrono::milliseconds open_delay_{100};
 
+  bool has_message_ = false;                       // one came whole
   std::optional<Clock::time_point> first_signal_;  // of those since the last reading began
   std::optional<Clock::time_point> read_at_;
   std::chrono::seconds retry_delay_{1};
   bool is_reading_ = false;
   bool is_stale_ = false;  // a signal came while the reading was on its way
+  bool is_mute_ = false;   // a call got no answer in time
   Reading reading_;
+  std::optional<Reading> disturbed_;  // the last reading, when it was stale
   // The calls on their way, by serial: for the modems, and for each one's card with the modem's place. An answer to any
   // other call belongs to a reading that was given up.
   std::uint64_t objects_call_ = 0;

@@ -158,6 +158,13 @@ TEST_F(Bridge, ReadsOnceForABurstAndNeverTwoCardsAtATime) {
                   body("sa{sv}as", kModem, 0, 1, "Sim"));
   EXPECT_EQ(next(watcher), "sim-newly-inserted: Ready A2 26202");
   EXPECT_LE(bus.calls("GetManagedObjects") - before, 5) << "for each signal of the burst";
+  // A signal comes into every reading, and they all say the same.
+  bus.answer(kCardPath, [this](sd_bus_message* message) {
+    tell_modem_changed();
+    return dictionary_of(card("A3"))(message);
+  });
+  tell_modem_changed();
+  EXPECT_TRUE(eventually([] { return field(shown(), "iccid") == "A3"; }));
 }
 
 // Each row is something that a bus or a modem service may say; a proper answer behind it is read all the same.
@@ -223,6 +230,10 @@ TEST_F(Bridge, OutlivesAHostileBus) {
                          body("u", 1u));
        }},
       {"garbage", [&] { bus.send_bytes(std::string(4096, '\x7f')); }},
+      {"a message of 32 MiB that never ends",
+       [&] {
+         bus.send_bytes({"l\x04\0\x01\0\0\0\x02\x7f\0\0\0\x40\0\0\0", 16});
+       }},
       {"a part of a message", [&] { bus.send_bytes("l"), bus.disconnect(); }},
       {"an end", [&] { bus.disconnect(); }},
   };
