@@ -114,6 +114,9 @@ Telling Facts::tell(const Modem* modem) {
     const std::string device = modem != nullptr ? modem->device : "";
     if (device != chosen_) telling.lines.push_back(choice(modem));
     chosen_ = device;
+    std::string others = others_than(modem);
+    if (!others.empty() && others != others_) telling.lines.push_back("also there: " + others);
+    others_ = std::move(others);
   }
   if (!telling.events.empty()) telling.lines.push_back(told_line(telling, modem, status));
   if (telling.events.empty() && waited) telling.lines.emplace_back("nothing has changed");
@@ -153,6 +156,14 @@ std::string Facts::choice(const Modem* modem) const {
   const std::string text = "following the modem " + modem->device + ", ";
   if (!pinned_.empty()) return text + "as --device says";
   return text + (reading_.modems.size() == 1 ? "the only one" : "the best of " + devices_of(reading_));
+}
+
+std::string Facts::others_than(const Modem* modem) const {
+  std::vector<std::string> others;
+  for (const Modem& other : reading_.modems) {
+    if (&other != modem) others.push_back("the modem " + other.device + " (" + text_of(other) + ")");
+  }
+  return list_of(others);
 }
 
 std::string Facts::told_line(const Telling& telling, const Modem* modem, const std::string& status) const {

@@ -42,6 +42,7 @@ class Facts {
                                                 const std::string& status) const;
   [[nodiscard]] std::string missing() const;
   [[nodiscard]] std::string choice(const Modem* modem) const;
+  [[nodiscard]] std::string others_than(const Modem* modem) const;
   [[nodiscard]] std::string told_line(const Telling& telling, const Modem* modem, const std::string& status) const;
   void remember(const PropertyValue& state, const Modem* modem, const std::string& status);
 
@@ -49,6 +50,7 @@ class Facts {
   bool shows_identities_;
   Reading reading_;
   std::string chosen_;  // the device of the modem that was told last
+  std::string others_;  // modems that are not followed, as the log named them last
   std::optional<Clock::time_point> deadline_;
 
   PropertyValue told_;  // the last told state, none before the first

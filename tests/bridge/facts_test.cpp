@@ -185,10 +185,10 @@ TEST(Facts, FollowsThePinnedDeviceAndHidesIdentities) {
   Facts facts("b");
   const Telling telling =
       facts.take(of({called("a", ready("12345", "6")), called("b", ready("8949353", "262021"))}), {});
-  EXPECT_EQ(telling.lines,
-            std::vector<std::string>({"following the modem b, as --device says",
-                                      "told sim-status-changed, postponement-status-changed for the first time: SIM "
-                                      "status Ready, card ...9353, subscriber ...2021"}));
+  EXPECT_EQ(telling.lines, std::vector<std::string>(
+                               {"following the modem b, as --device says", "also there: the modem a (SIM status Ready)",
+                                "told sim-status-changed, postponement-status-changed for the first time: SIM "
+                                "status Ready, card ...9353, subscriber ...2021"}));
   EXPECT_TRUE(Facts({}, true)
                   .take(of({ready("8949353", "262021")}), {})
                   .lines.back()

@@ -65,9 +65,9 @@ class ModemManager : public testing::Test {
   }
 
   // Plugs the modem in, or again: ModemManager makes it anew.
-  static bool plug(const std::string& port) {
-    return call("/org/freedesktop/ModemManager1", std::string(kName) + ".Test", "SetProfile", "ssas", "first",
-                "quectel", 1, port.c_str());
+  static bool plug(const std::string& port, const char* device = "first") {
+    return call("/org/freedesktop/ModemManager1", std::string(kName) + ".Test", "SetProfile", "ssas", device, "quectel",
+                1, port.c_str());
   }
 
   static bool send_pin(const char* pin) {
@@ -80,6 +80,8 @@ class ModemManager : public testing::Test {
   }
 
   void plug_again() { EXPECT_TRUE(plug(modem.port())); }
+  void plug_second() { EXPECT_TRUE(plug(second.port(), "second")); }
+  static void unplug(const char* device) { EXPECT_TRUE(plug("abstract:nobody", device)); }
   // Reports the card that is in the tray to ModemManager.
   void swap(const char* iccid, const std::string& imsi) {
     modem.insert(iccid, imsi);
@@ -99,6 +101,7 @@ class ModemManager : public testing::Test {
   Device older{Device::Baseband::older};
   std::string address;
   FakeModem modem{"quorvel-" + std::to_string(::getpid())};
+  FakeModem second{"quorvel-second-" + std::to_string(::getpid())};
   std::optional<Program> bus, manager;
 };
 
@@ -117,8 +120,8 @@ TEST_F(ModemManager, DaemonsFollowALifeOfAModem) {
       {"the wrong PIN", 0, [&] { EXPECT_FALSE(send_pin("4321")); }},
       {"the right PIN", 2, [&] { EXPECT_TRUE(send_pin("1234")); }},
       {"the same card, locked again", 2, [&] { lock(), plug_again(); }},
-      {"another locked card", 3, [&] { modem.insert(kCardOfFirst, ""), lock(), modem.report_swap(); }},
-      {"a card without a lock", 2, [&] { swap(kCardOfFirst, "262021234567890"); }},
+      {"another locked card", 3, [&] { modem.insert(kCardOfFirst, ""), lock(), plug_again(); }},
+      {"a card without a lock", 2, [&] { modem.insert(kCardOfFirst, "262021234567890"), plug_again(); }},
       {"another number", 2,
        [&] {
          modem.answer("AT+CNUM", "+CNUM: \"\",\"+4915199999999\",145");
@@ -133,7 +136,20 @@ TEST_F(ModemManager, DaemonsFollowALifeOfAModem) {
        }},
       {"a card that can", 2, [&] { modem.insert(kCardOfFirst, "262021234567890"), plug_again(); }},
       {"another firmware", 2, [&] { modem.answer("AT+CGMR", "FW 2.0"), plug_again(); }},
-      {"unplugged", 2, [&] { EXPECT_TRUE(plug("abstract:nobody")); }},
+      {"a second modem", 0,
+       [&] {
+         second.insert(kCardOfSecond, "262028888888888");
+         plug_second();
+         EXPECT_TRUE(has_told(older, "also there: the modem /virtual/second (SIM status Ready)"));
+       }},
+      {"no card in the first", 3, [&] { modem.eject(), plug_again(); }},
+      {"a card in the first", 0,
+       [&] {
+         modem.insert(kCardOfFirst, "262021234567890"), plug_again();
+         EXPECT_TRUE(has_told(older, "also there: the modem /virtual/first (SIM status Ready)"));
+       }},
+      {"no card in the second", 3, [&] { second.eject(), plug_second(); }},
+      {"unplugged", 2, [&] { unplug("second"), unplug("first"); }},
       {"plugged in", 2, [&] { plug_again(); }},
       {"ModemManager killed", 2, [&] { end(manager); }},
       {"ModemManager back", 2, [&] { start_manager(); }},
@@ -165,7 +181,7 @@ TEST_F(ModemManager, DaemonsFollowALifeOfAModem) {
   // A daemon and a bridge that start again under the other one: the facts are there, and nothing has changed.
   older.daemon->stop();
   older.start_daemon();
-  EXPECT_EQ(older.traces(steps.front().older).lines, steps.front().older.lines);
+  EXPECT_EQ(older.traces({steps.front().older.lines, 0}).lines, steps.front().older.lines);
   end(older.service);
   older.serve(bridge_program());
   EXPECT_TRUE(has_told(older, "for the first time: SIM status Ready"));
