@@ -2,8 +2,8 @@
 # The Debian packages that the scripts need, each list once. To be sourced.
 
 declare -A packages=(
-  # To configure and build everything, tests included.
-  [build]="g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev"
+  # To configure and build everything, tests included. The compiler optimises across files in parallel by means of make.
+  [build]="g++ cmake make ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev"
   # To build the bridge to ModemManager, and to test it on the real one.
   [bridge]="libsystemd-dev modemmanager dbus-daemon"
   # To cut the power of a disk: one whose content a process serves, and the file systems on it.

@@ -37,7 +37,8 @@ find_package(quorvel 1.0 REQUIRED)
 add_executable(example $example)
 target_link_libraries(example PRIVATE quorvel::quorvel)
 END
-cmake -S "$scratch/project" -B "$scratch/project" -DCMAKE_PREFIX_PATH="$scratch/prefix" -DCMAKE_C_COMPILER="$cc" >/dev/null
+cmake -G Ninja -S "$scratch/project" -B "$scratch/project" -DCMAKE_PREFIX_PATH="$scratch/prefix" \
+  -DCMAKE_C_COMPILER="$cc" >/dev/null
 cmake --build "$scratch/project" >/dev/null
 programs+=("$scratch/project/example")
 
