@@ -12,6 +12,7 @@
 #include <array>
 
 #include "linux/base/local_socket.h"
+#include "quorvel/observer.h"
 #include "stress/stressed_daemon.h"
 
 namespace quorvel::test {
@@ -187,8 +188,8 @@ TEST_P(OtherUserTest, TakesNobodysPlace) {
   for (long i = 0; i < calls_made; ++i) {
     waits.push_back(well_behaved_call());
     const auto start = std::chrono::steady_clock::now();
-    SocketPeer observer = SocketPeer::connected_to("notifications.sock");
-    EXPECT_TRUE(observer.receive(2s)) << "an observer was not greeted";
+    const std::optional<client::Error> trouble = client::Observer().connect();
+    EXPECT_FALSE(trouble) << "an observer was not greeted: " << trouble->description;
     greeted =
         std::max(greeted, std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start).count());
     std::this_thread::sleep_for(50ms);
