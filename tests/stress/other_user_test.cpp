@@ -10,6 +10,7 @@
 #include <sys/wait.h>
 
 #include <array>
+#include <csignal>
 
 #include "linux/base/local_socket.h"
 #include "quorvel/observer.h"
@@ -69,9 +70,15 @@ Descriptor lingering_socket() {
   return writer;
 }
 
+// The service may have dropped it before its sender closes it, who would then wait for hours: a signal ends that.
 bool send_lingering(int socket, std::string_view bytes) {
-  const Descriptor attachment = lingering_socket();
-  return send_attached(socket, bytes, std::array{attachment.get()}) > 0;
+  Descriptor attachment = lingering_socket();
+  const bool sent = send_attached(socket, bytes, std::array{attachment.get()}) > 0;
+  std::signal(SIGALRM, [](int) {});
+  ::ualarm(1000, 1000);
+  attachment = Descriptor();
+  ::ualarm(0, 0);
+  return sent;
 }
 
 void PrintTo(const Attack& attack, std::ostream* out) { *out << attack.name; }
