@@ -12,6 +12,7 @@ namespace quorvel::platform::host {
 namespace {
 
 constexpr std::int64_t kRestMilliseconds = 50;
+constexpr std::int64_t kBriefRestMilliseconds = 2;
 
 }  // namespace
 
@@ -45,10 +46,14 @@ Descriptor RestingListener::accept() noexcept {
   }
 }
 
-void RestingListener::rest() noexcept {
+void RestingListener::rest() noexcept { rest_for(kRestMilliseconds); }
+
+void RestingListener::rest_briefly() noexcept { rest_for(kBriefRestMilliseconds); }
+
+void RestingListener::rest_for(std::int64_t milliseconds) noexcept {
   if (is_resting()) return;
   queue_->remove(socket_);
-  rests_until_ = monotonic_milliseconds() + kRestMilliseconds;
+  rests_until_ = monotonic_milliseconds() + milliseconds;
 }
 
 void RestingListener::end_rest() noexcept {

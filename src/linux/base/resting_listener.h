@@ -26,6 +26,8 @@ class RestingListener {
   [[nodiscard]] Descriptor accept() noexcept;
 
   void rest() noexcept;
+  /// Rests for a moment only: places that are missing will be free as soon as others have had their turn.
+  void rest_briefly() noexcept;
   [[nodiscard]] bool is_resting() const noexcept { return rests_until_ != kNever; }
   /// Says that a connection was closed: the rest ends at the next `wake_when_due`.
   void end_rest() noexcept;
@@ -38,6 +40,7 @@ class RestingListener {
   static constexpr std::int64_t kNever = std::numeric_limits<std::int64_t>::max();
 
   void listen() noexcept;
+  void rest_for(std::int64_t milliseconds) noexcept;
 
   const EventQueue* queue_ = nullptr;
   int socket_ = -1;

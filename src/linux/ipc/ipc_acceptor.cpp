@@ -40,7 +40,7 @@ void IpcAcceptor::accept_some() noexcept {
 // is made afterwards.
 bool IpcAcceptor::accept_one() noexcept {
   if (!has_place_for_one_more()) {
-    socket_.rest();
+    socket_.rest_briefly();
     return false;
   }
   if (Descriptor socket = socket_.accept()) {

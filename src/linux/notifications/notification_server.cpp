@@ -135,10 +135,10 @@ void NotificationServer::accept_waiting() noexcept {
     if (accepted == kLongestQueue) return;
     Descriptor socket = listener_.accept();
     if (!socket) return;
-    if (!take_in(std::move(socket))) break;
+    if (!take_in(std::move(socket))) return listener_.rest();
     if (places_.are_overfull()) make_room();
   }
-  listener_.rest();
+  listener_.rest_briefly();
 }
 
 // Of the user who has most observers, the newest gives way: those that have listened for long miss nothing.

@@ -119,9 +119,9 @@ int start_process(std::string_view service_name) noexcept {
     host::print_system_error("cannot make the run loop");
     return EX_OSERR;
   }
+  if (!has_enough_descriptors()) return EX_OSERR;
   if (const int status = settle_root(); status != 0) return status;
   ::umask(022);
-  if (!has_enough_descriptors()) return EX_OSERR;
   bound_idle_memory();
   // The socket is asked about first: the lock of another user's instance cannot even be opened.
   int status = refuse_served_socket(service_name);
