@@ -11,6 +11,7 @@
 
 #include "bench/cases/case.h"
 #include "bench/support/measurements.h"
+#include "bench/support/program.h"
 #include "bench/support/scratch_root.h"
 #include "bench/support/table.h"
 
@@ -86,10 +87,5 @@ int run(int argc, char** argv) {
 }  // namespace quorvel::bench
 
 int main(int argc, char** argv) {
-  try {
-    return quorvel::bench::run(argc, argv);
-  } catch (const std::exception& error) {
-    std::cerr << "quorvel_bench: " << error.what() << '\n';
-    return 1;
-  }
+  return quorvel::bench::run_program("quorvel_bench", quorvel::bench::run, argc, argv);
 }

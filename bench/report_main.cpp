@@ -11,6 +11,7 @@
 #include <stdexcept>
 #include <string>
 
+#include "bench/support/program.h"
 #include "bench/support/table.h"
 
 namespace quorvel::bench {
@@ -93,10 +94,5 @@ int run(int argc, char** argv) {
 }  // namespace quorvel::bench
 
 int main(int argc, char** argv) {
-  try {
-    return quorvel::bench::run(argc, argv);
-  } catch (const std::exception& error) {
-    std::cerr << "quorvel_bench_report: " << error.what() << '\n';
-    return 1;
-  }
+  return quorvel::bench::run_program("quorvel_bench_report", quorvel::bench::run, argc, argv);
 }

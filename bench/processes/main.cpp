@@ -11,6 +11,7 @@
 #include "bench/processes/program.h"
 #include "bench/processes/service.h"
 #include "bench/support/measurements.h"
+#include "bench/support/program.h"
 #include "bench/support/scratch_root.h"
 #include "bench/support/table.h"
 
@@ -78,10 +79,5 @@ int run(int argc, char** argv) {
 }  // namespace quorvel::bench
 
 int main(int argc, char** argv) {
-  try {
-    return quorvel::bench::run(argc, argv);
-  } catch (const std::exception& error) {
-    std::cerr << "quorvel_bench_processes: " << error.what() << '\n';
-    return 1;
-  }
+  return quorvel::bench::run_program("quorvel_bench_processes", quorvel::bench::run, argc, argv);
 }

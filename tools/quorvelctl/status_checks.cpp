@@ -5,6 +5,7 @@
 #include <chrono>
 #include <cstdio>
 #include <optional>
+#include <utility>
 
 #include "common/failure.h"
 #include "common/human_text.h"
@@ -52,6 +53,12 @@ std::string why_not_followed(const Server& service, bool marked) {
 
 }  // namespace
 
+void find_ill(Finding& finding, std::string reason, const std::string& heading) {
+  finding.verdict = Verdict::ill;
+  finding.lines.push_back(heading + reason);
+  finding.reason = std::move(reason);
+}
+
 Finding check_calls() {
   client::Options options;
   options.timeout = kPatience;
@@ -68,9 +75,7 @@ Finding check_calls() {
     finding.lines.emplace_back(text);
     put(finding.facts, "milliseconds", PropertyValue::real(milliseconds));
   } else {
-    finding.verdict = Verdict::ill;
-    finding.reason = reply.error ? reply.error->description : std::string("no reply");
-    finding.lines.push_back("not answered: " + finding.reason);
+    find_ill(finding, reply.error ? reply.error->description : std::string("no reply"), "not answered: ");
   }
   return finding;
 }
@@ -108,9 +113,7 @@ Finding check_telephony(const Server& daemon) {
   const std::optional<bool> followed = daemon.process > 0 ? follows_telephony(daemon.process) : false;
   if (followed) put(finding.facts, "followed", PropertyValue::boolean(*followed));
   if (service.state == Server::State::serving && has_ended(service)) {
-    finding.verdict = Verdict::ill;
-    finding.reason = "process " + std::to_string(service.process) + ", which served it, has ended";
-    finding.lines.push_back(finding.reason);
+    find_ill(finding, "process " + std::to_string(service.process) + ", which served it, has ended");
     return finding;
   }
   if (followed.value_or(false)) {
@@ -120,9 +123,8 @@ Finding check_telephony(const Server& daemon) {
     finding.reason = "only root and the daemon's user can see whether it is";
     finding.lines.push_back("followed or not: " + finding.reason);
   } else {
-    finding.verdict = Verdict::ill;
-    finding.reason = daemon.process > 0 ? why_not_followed(service, marked) : "the daemon does not run";
-    finding.lines.push_back("not followed: " + finding.reason);
+    find_ill(finding, daemon.process > 0 ? why_not_followed(service, marked) : "the daemon does not run",
+             "not followed: ");
   }
   if (service.state != Server::State::serving) return finding;
   finding.lines.push_back("served by " + name_of(service));

@@ -20,6 +20,9 @@ struct Finding {
   PropertyValue facts;             // for programs, a dictionary
 };
 
+/// The look found something wrong; people are told `reason` behind `heading`.
+void find_ill(Finding& finding, std::string reason, const std::string& heading = {});
+
 /// Dates count from 2001, the kernel from 1970.
 inline constexpr double kSecondsTo2001 = 978'307'200;
 

@@ -50,9 +50,7 @@ Finding check_ark() {
                             since_text(saved));
     put(finding.facts, "saved", PropertyValue::date(saved));
   } catch (const Failure& failure) {
-    finding.verdict = Verdict::ill;
-    finding.reason = failure.message;
-    finding.lines.push_back(failure.message);
+    find_ill(finding, failure.message);
   }
   return finding;
 }
@@ -72,17 +70,13 @@ Finding check_log() {
     while (tail.ends_with('\n')) tail.pop_back();
     const std::string last = displayable(tail.substr(tail.rfind('\n') + 1));
     if (last.empty()) {
-      finding.verdict = Verdict::ill;
-      finding.reason = "is missing or empty";
-      finding.lines.push_back(finding.reason);
+      find_ill(finding, "is missing or empty");
     } else {
       finding.lines.push_back(last);
       put(finding.facts, "last", PropertyValue::string(last));
     }
   } catch (const Failure& failure) {
-    finding.verdict = Verdict::ill;
-    finding.reason = failure.message;
-    finding.lines.push_back(failure.message);
+    find_ill(finding, failure.message);
   }
   return finding;
 }
