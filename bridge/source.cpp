@@ -119,8 +119,8 @@ void ModemManagerSource::close() {
 }
 
 void ModemManagerSource::lose_bus(int error) {
+  say(std::string(bus_ == nullptr ? "there is no bus: " : "the bus is lost: ") + std::strerror(-error));
   close();
-  say(std::string("the bus is lost: ") + std::strerror(-error));
   complete_ = Reading{Reach::bus_lost, {}, 0};
   last_reach_ = Reach::bus_lost;
   open_at_ = Clock::now() + open_delay_;
@@ -284,11 +284,13 @@ int ModemManagerSource::on_card(sd_bus_message* message, void* context, sd_bus_e
   return 0;
 }
 
-// A reading of modems stands meanwhile; one that says that nothing runs is wrong by now.
+// A reading of modems stands meanwhile; one that says that nothing runs is wrong by now. A bus that goes fails its
+// calls first, and is told of then.
 void ModemManagerSource::fail_reading(const std::string& reason, int error) {
   objects_call_ = 0;
   card_calls_.clear();
   is_reading_ = false;
+  if (sd_bus_is_open(bus_) <= 0) return;
   is_mute_ = error == ETIMEDOUT;
   if (is_stale_) return;
   say("cannot read ModemManager: " + reason);

@@ -7,7 +7,6 @@
 #include <cerrno>
 #include <system_error>
 
-#include "linux/base/error_line.h"
 #include "linux/process/service_manager.h"
 #include "platform/file_system.h"
 #include "wire/service_path.h"
@@ -26,8 +25,6 @@ constexpr int kBacklog = 256;
 std::string socket_path() { return std::string(wire::kServiceDirectory) + '/' + std::string(wire::kTelephonySocket); }
 
 ListeningSocket open_listener() {
-  platform::host::name_error_lines(::program_invocation_short_name);
-  platform::host::settle_passed_sockets();
   if (Descriptor passed = platform::host::take_passed_socket()) {
     // Whoever connects is shown who listened last: from now on this service, no more the service manager.
     if (::listen(passed.get(), kBacklog) != 0) fail(socket_path());

@@ -7,9 +7,9 @@
 
 namespace quorvel::telephony {
 
-/// The socket that the service manager passed, or one made in the service directory, whose missing directories are
-/// made. Mode 0600 and the directory's owner: the daemon's user. Throws std::system_error; EADDRINUSE says that another
-/// service is running.
+/// The socket that the service manager passed, once passed sockets are settled, or one made in the service directory,
+/// whose missing directories are made. Mode 0600 and the directory's owner: the daemon's user. Throws
+/// std::system_error; EADDRINUSE says that another service is running.
 [[nodiscard]] platform::host::ListeningSocket open_listener();
 
 /// The socket's path in the device root.

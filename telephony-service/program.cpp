@@ -18,6 +18,8 @@
 #include "common/human_text.h"
 #include "common/root_option.h"
 #include "common/words.h"
+#include "linux/base/error_line.h"
+#include "linux/process/service_manager.h"
 #include "telephony-service/listener.h"
 
 namespace quorvel::telephony {
@@ -78,6 +80,9 @@ void print_line(const std::string& program, const std::string& text) {
 }
 
 int run_program(const std::string& program, int (*run)(int count, char** words), int count, char** words) {
+  platform::host::name_error_lines(::program_invocation_short_name);
+  // Before anything is opened, which could pass for a socket that was announced and is not there.
+  platform::host::settle_passed_sockets();
   try {
     return run(count, words);
   } catch (const Failure& failure) {

@@ -59,10 +59,12 @@ TEST(PassedSockets, AreServedWhereTheyCanBe) {
   const platform::host::ListeningSocket passed = platform::host::ListeningSocket::open("telvane.sock", 0600);
   ASSERT_EQ(::fcntl(passed.get(), F_SETFD, 0), 0);
   const std::string command = "exec 3</dev/null 4<&" + std::to_string(passed.get()) +
-                              "; LISTEN_FDS=2 LISTEN_PID=$$ exec " + simulator_program();
+                              "; LISTEN_FDS=3 LISTEN_PID=$$ exec " + simulator_program();
   Program simulator("/bin/bash", {.arguments = {"-c", command}, .input = {}});
   EXPECT_EQ(Observer().next(), "state {}");
-  EXPECT_EQ(simulator.stop().err, "telvane-sim: passed descriptors (LISTEN_FDS) that are no local stream sockets: 1\n");
+  EXPECT_EQ(simulator.stop().err,
+            "telvane-sim: passed descriptors (LISTEN_FDS) that are not open: 1\n"
+            "telvane-sim: passed descriptors (LISTEN_FDS) that are no local stream sockets: 1\n");
   EXPECT_TRUE(root.exists(kSocket)) << "its file is not the simulator's";
 }
 
