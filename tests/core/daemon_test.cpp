@@ -1,7 +1,11 @@
 // The daemon as it is installed: start-up, the state directory, the operation, and the end.
+#include <sys/ptrace.h>
+#include <sys/wait.h>
+
 #include "platform/ipc.h"
 #include "protocol/quorvel_protocol.h"
 #include "quorvel/client.h"
+#include "support/figures.h"
 #include "support/program.h"
 #include "support/scratch_root.h"
 
@@ -137,6 +141,33 @@ TEST_F(Daemon, SigintEndsItAndASecondOneIsRefused) {
   EXPECT_EQ(outcome.status, 0);
   EXPECT_EQ(outcome.err, "");
   EXPECT_TRUE(!root.exists("/run/quorvel/com.Orvane.quorveld.sock"));
+}
+
+// Threads that a debugger stops stand for those that wait for a disk. All of them together hold the end up only once.
+TEST_F(Daemon, EndsWithoutThreadsThatDoNotComeBack) {
+  if (kInstrumented) GTEST_SKIP() << "a sanitizer waits for every thread";
+  root.ignore_log();
+  Program daemon(daemon_program());
+  ASSERT_TRUE(daemon.wait_until_ready());
+  std::vector<pid_t> stuck;
+  for (const auto& task : std::filesystem::directory_iterator("/proc/" + std::to_string(daemon.pid()) + "/task")) {
+    const pid_t thread = std::stoi(task.path().filename());
+    if (thread == daemon.pid()) continue;
+    if (::ptrace(PTRACE_SEIZE, thread, nullptr, nullptr) != 0) GTEST_SKIP() << "threads cannot be stopped here";
+    ASSERT_EQ(::ptrace(PTRACE_INTERRUPT, thread, nullptr, nullptr), 0);
+    ASSERT_EQ(::waitpid(thread, nullptr, __WALL), thread);
+    stuck.push_back(thread);
+  }
+  EXPECT_GE(stuck.size(), 3u);
+  const auto start = std::chrono::steady_clock::now();
+  daemon.send_signal(SIGTERM);
+  for (const pid_t thread : stuck) ::waitpid(thread, nullptr, __WALL);
+  const Outcome outcome = daemon.wait();
+  EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+  EXPECT_EQ(outcome.status, 0);
+  EXPECT_EQ(outcome.err,
+            "quorveld: a thread of the IPC service does not end; it is left behind\n"
+            "quorveld: the thread of the notification center does not end\n");
 }
 
 }  // namespace quorvel::test

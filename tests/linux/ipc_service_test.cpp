@@ -156,21 +156,6 @@ TEST_F(IpcService, RefusesAttachedDescriptorsWhereTheKernelCan) {
   expect_served(peer);
 }
 
-// The thread that runs the operation does not come back in time; the process ends without it.
-TEST_F(IpcService, EndsWithoutAThreadThatDoesNotComeBack) {
-  stop();
-  const auto end_beside_a_stuck_operation = [&] {
-    start();
-    SocketPeer peer = client();
-    static_cast<void>(peer.send(call("meet", 1)));
-    if (!eventually([] { return callers_of_meet == 1; })) return 1;
-    const auto begin = std::chrono::steady_clock::now();
-    stop();
-    return std::chrono::steady_clock::now() - begin < 1s ? 0 : 2;
-  };
-  EXPECT_EXIT(::_exit(end_beside_a_stuck_operation()), testing::ExitedWithCode(0), "left behind");
-}
-
 TEST_F(IpcService, ARefusedFrameClosesItsConnectionAndNoOther) {
   SocketPeer neighbour = client();
   expect_served(neighbour);
