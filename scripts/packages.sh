@@ -54,3 +54,24 @@ debian_mirror() {
   uri=$(apt-get indextargets --format '$(REPO_URI)' 2>/dev/null | grep '/debian/*$' | head -n 1)
   echo "${uri:-http://deb.debian.org/debian}"
 }
+
+# with_lists_of ARCHITECTURE FOLDER COMMAND...: runs COMMAND in FOLDER with apt on lists of that architecture, which the
+# machine itself does not see. For packages that are fetched, not installed.
+with_lists_of() {
+  local arch=$1 folder=$2 status=0
+  shift 2
+  mkdir -p "$folder"/apt/{lists/partial,archives/partial} || return
+  : >"$folder/apt/status"
+  cat >"$folder/apt/apt.conf" <<CONF
+APT::Architecture "$arch";
+APT::Architectures { "$arch"; };
+APT::Sandbox::User "";
+Acquire::Languages "none";
+Dir::State::Lists "$folder/apt/lists";
+Dir::State::status "$folder/apt/status";
+Dir::Cache "$folder/apt";
+CONF
+  (export APT_CONFIG=$folder/apt/apt.conf && cd "$folder" && apt-get update -qq && "$@") || status=$?
+  rm -rf "$folder/apt"
+  return $status
+}
