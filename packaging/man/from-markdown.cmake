@@ -41,7 +41,8 @@ string(TOUPPER ${name} title)
 execute_process(COMMAND ${LOWDOWN} -s -Tman -m "title: ${title}" -m "section: ${section}" ${OUT}.md
                 OUTPUT_VARIABLE made COMMAND_ERROR_IS_FATAL ANY)
 file(REMOVE ${OUT}.md)
-# Headings on the lines of their macros, as programs that index pages expect them, and no stretched lines in tables.
+# Headings on the lines of their macros, as programs that index pages expect them, and no stretched lines: newer
+# formatters go back to what AD says at each paragraph.
 string(REGEX REPLACE "\n\\.(SH|SS)\n" "\n.\\1 " made "${made}")
-string(REGEX REPLACE "\n(\\.TH [^\n]*\n)" "\n\\1.ad l\n" made "${made}")
+string(REGEX REPLACE "\n(\\.TH [^\n]*\n)" "\n\\1.ds AD l\n.ad l\n" made "${made}")
 file(WRITE ${OUT} "'\\\" t\n${made}")
