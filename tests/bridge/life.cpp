@@ -36,8 +36,11 @@ std::string text_of(const Step& step) {
 }
 
 std::vector<std::string> steps_recorded(const std::string& path) {
+  constexpr const char* kTime = ",\"time\"";
   std::vector<std::string> steps = lines_of(path);
-  for (std::string& step : steps) step.erase(step.rfind(",\"time\""));
+  // A line that is still being written is none yet.
+  std::erase_if(steps, [](const std::string& step) { return step.find(kTime) == std::string::npos; });
+  for (std::string& step : steps) step.erase(step.rfind(kTime));
   return steps;
 }
 
