@@ -27,7 +27,8 @@ CLI::App& add_command(CLI::App& parent, const CommandWords& words);
 /// Adds a command that does nothing but lead to those below it, one of which a call has to choose.
 CLI::App& add_group(CLI::App& parent, const CommandWords& words);
 
-/// What follows goes to `word`, `words`, `value` or `on` while the words of a call are parsed; it must outlive that.
+// What a call gives for a word or an option goes where the function that adds it says, which must outlive the parsing.
+
 /// A word that a command needs, taken as it stands.
 void add_word(CLI::App& command, const std::string& name, std::string& word, const std::string& help);
 /// Any number of words.
