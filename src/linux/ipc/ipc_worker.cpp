@@ -232,9 +232,7 @@ void IpcWorker::settle(IpcConnection& connection) noexcept {
     stages_.move(connection, Stage::ready, now_);
   } else if (connection.input_ended) {
     return close(connection);
-  } else if (!has_input) {
-    if (connection.stage > Stage::idle) stages_.move(connection, Stage::idle, now_);
-  } else if (connection.stage != Stage::partial) {
+  } else if (has_input && connection.stage != Stage::partial) {
     stages_.move(connection, Stage::partial, now_);
   }
   bound_held_input();

@@ -93,8 +93,7 @@ void TelephonyStream::close() noexcept {
 TelephonyStream::Result TelephonyStream::next(wire::Frame& frame) noexcept {
   const Result buffered = take_frame(frame);
   if (buffered != Result::nothing) return buffered;
-  const Result received = receive();
-  return received == Result::frame ? take_frame(frame) : received;
+  return receive() ? take_frame(frame) : Result::gone;
 }
 
 TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept {
@@ -113,20 +112,19 @@ TelephonyStream::Result TelephonyStream::take_frame(wire::Frame& frame) noexcept
   return Result::gone;
 }
 
-// `frame` here says that bytes came. Room for one large frame is not kept for the small ones that usually follow.
-TelephonyStream::Result TelephonyStream::receive() noexcept {
+// False when the service has left. Room for one large frame is not kept for the small ones that usually follow.
+bool TelephonyStream::receive() noexcept {
   const std::span<std::byte> room = input_.room(kReceiveSize, 2 * kReceiveSize);
-  if (room.empty()) return Result::gone;
+  if (room.empty()) return false;
   const ssize_t count = ::recv(descriptor(), room.data(), room.size(), MSG_DONTWAIT);
   const int error = errno;
   if (count > 0) input_.arrived(static_cast<std::size_t>(count));
-  if (count > 0) return Result::frame;
-  if (count < 0 && (error == EAGAIN || error == EINTR)) return Result::nothing;
+  if (count > 0 || (count < 0 && (error == EAGAIN || error == EINTR))) return true;
   if (should_tell(TelephonyTrouble::loss, count == 0 ? 0 : error)) {
     print_error_line("the telephony service on %s (process %d, user %u) left%s%s", paths::kTelephonySocket, process_,
                      user_, count == 0 ? "" : ": ", count == 0 ? "" : ::strerrordesc_np(error));
   }
-  return Result::gone;
+  return false;
 }
 
 }  // namespace quorvel::platform::host

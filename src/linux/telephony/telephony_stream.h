@@ -35,7 +35,7 @@ class TelephonyStream {
  private:
   [[nodiscard]] bool is_trusted(int directory, int socket) noexcept;
   [[nodiscard]] Result take_frame(wire::Frame& frame) noexcept;
-  [[nodiscard]] Result receive() noexcept;
+  [[nodiscard]] bool receive() noexcept;
 
   Descriptor socket_;
   pid_t process_ = 0;  // who listens, for the texts
