@@ -1,5 +1,6 @@
 // What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
 #include <sched.h>
+#include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -131,6 +132,9 @@ TEST(ProcessStart, RefusesASecondInstance) {
     EXPECT_FALSE(root.exists("/run/quorvel/notifications.sock"));
   }
   EXPECT_START(0, "^$") << "the socket is stale now";
+  const Descriptor held(::open(root.path("/run/quorvel/quorveld.lock").c_str(), O_RDWR));
+  ASSERT_EQ(::flock(held.get(), LOCK_EX), 0);
+  EXPECT_START(69, "^quorveld: another quorveld is running \\(it holds /run/quorvel/quorveld.lock\\)\n$");
 }
 
 TEST(ProcessStart, RefusesALockFileThatIsNone) {
@@ -199,6 +203,13 @@ TEST(ProcessStart, ReplacesOnlySocketsThatNobodyServes) {
     const ListeningSocket socket = ListeningSocket::open("b.sock");
     root.remove("/run/quorvel/b.sock");
     root.write_file("/run/quorvel/b.sock", "another's");
+  }
+  if (::geteuid() == 0) {
+    ASSERT_EQ(::chown(root.path("/run/quorvel").c_str(), 12345, 12345), 0);
+    const ListeningSocket socket = ListeningSocket::open("c.sock");
+    struct stat status;
+    ASSERT_EQ(::lstat(root.path("/run/quorvel/c.sock").c_str(), &status), 0);
+    EXPECT_EQ(status.st_uid, 12345u) << "root serves the directory's owner";
   }
   EXPECT_EQ(root.read_file("/run/quorvel/b.sock"), "another's");
   EXPECT_FALSE(root.exists("/run/quorvel/a.sock"));

@@ -49,6 +49,7 @@ TEST(HumanText, IsSafeForTerminalsAndShells) {
   const PropertyValue value = test::dictionary(
       {{"b", test::array({1, test::dictionary({{"c", "x\ny"}})})}, {"a", test::dictionary({})}, {"", "\033"}});
   EXPECT_EQ(human_text(value), "\"\": \\x1b\na:  {}\nb:\n  - 1\n  -\n    c: x\\ny\n");
+  EXPECT_EQ(human_text(test::dictionary({})), "{}\n");
 }
 
 }  // namespace quorvel::tools

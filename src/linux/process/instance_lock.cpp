@@ -58,8 +58,10 @@ int take_instance_lock() noexcept {
     print_system_error("cannot open the lock file %s", paths::kInstanceLock);
     return EX_OSERR;
   }
-  int result = ::flock(file.get(), LOCK_EX | LOCK_NB);
-  while (result != 0 && errno == EINTR) result = ::flock(file.get(), LOCK_EX | LOCK_NB);
+  int result = 0;
+  do {
+    result = ::flock(file.get(), LOCK_EX | LOCK_NB);
+  } while (result != 0 && errno == EINTR);
   if (result == 0) {
     static_cast<void>(file.take());
     return 0;
