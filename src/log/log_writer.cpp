@@ -86,10 +86,9 @@ bool log_took_last_line() noexcept { return took_last_line; }
 
 int log_rotate_if_needed(const char* path, std::int64_t count) noexcept {
   if (count < kRotationThreshold) return 0;
-  char previous[platform::kPathSize + 1];
-  std::snprintf(previous, platform::kPathSize, "%s.%d", path, 1);
+  char previous[platform::kPathSize];
+  std::snprintf(previous, sizeof previous, "%s.1", path);
   platform::remove_file(previous);
-  std::snprintf(previous, platform::kPathSize, "%s.1", path);
   // A file that cannot be moved goes on growing; the next line tries again.
   static_cast<void>(platform::rename_file(path, previous));
   return 1;

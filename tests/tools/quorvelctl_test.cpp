@@ -219,7 +219,10 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   Program daemon(daemon_program(), {.input = {}, .environment = {{"QUORVEL_ROOT", made}}});
   ASSERT_TRUE(daemon.wait_until_ready());
   Program monitor(control_program(), {.arguments = {"--root", made, "monitor", "--json"}, .input = {}});
-  ASSERT_TRUE(eventually([&] { return monitor.err().find("listening") != std::string::npos; }));
+  Program reader(control_program(), {.arguments = {"--root", made, "monitor", "--count", "3"}, .input = {}});
+  for (const Program* observer : {&monitor, &reader}) {
+    ASSERT_TRUE(eventually([&] { return observer->err().find("listening") != std::string::npos; }));
+  }
   const auto call = [&](std::vector<std::string> words) {
     words.insert(words.begin(), {"--root", made});
     return run_to_end(control_program(), words);
@@ -227,6 +230,7 @@ TEST_F(Quorvelctl, MakesADeviceRootThatTheDaemonServes) {
   EXPECT_NE(call({"regulatory-images", "--json"}).out.find("\"Mark\": \"CE\""), std::string::npos);
   EXPECT_EQ(call({"sim", "insert", "--iccid", "89", "--imsi", "23"}).status, 0);
   EXPECT_TRUE(monitor.wait_for_output("\"sequence\":3"));
+  EXPECT_TRUE(reader.wait_for_output("  #3  com.Orvane.mobile.halvard.phone_number_changed\n"));
   EXPECT_TRUE(call({"sim", "set", "gid1", "7"}).err.starts_with("quorvelctl: a number is set, which"));
   EXPECT_EQ(call({"sim", "set", "postponement", "7"}).err, "");
   EXPECT_EQ(call({"sim", "clear", "postponement"}).status, 0);

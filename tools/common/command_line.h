@@ -43,7 +43,7 @@ void add_switch(CLI::App& command, const std::string& name, bool& on, const std:
 
 /// Has `then` called when the words of a call have chosen the command and are taken.
 void when_chosen(CLI::App& command, std::function<void()> then);
-/// Whether a call has given the option to this command.
+/// Whether a call has given the option, which must be one of this command's.
 [[nodiscard]] bool is_given(const CLI::App& command, const std::string& option);
 
 }  // namespace quorvel::tools

@@ -15,7 +15,7 @@ constexpr std::size_t kRemembered = 16;
 struct Told {
   int trouble = -1;
   int detail = 0;
-  std::int64_t when = 0;
+  std::int64_t when = -1;  // before everything that was told
 };
 
 Told told[kRemembered];  // one that is not remembered any more is told again
@@ -28,9 +28,7 @@ bool should_tell(TelephonyTrouble trouble, int detail) noexcept {
   Told* entry = std::find_if(std::begin(told), std::end(told),
                              [&](const Told& earlier) { return earlier.trouble == kind && earlier.detail == detail; });
   if (entry == std::end(told)) {
-    const auto is_older = [](const Told& left, const Told& right) {
-      return left.trouble < 0 ? right.trouble >= 0 : right.trouble >= 0 && left.when < right.when;
-    };
+    const auto is_older = [](const Told& left, const Told& right) { return left.when < right.when; };
     entry = std::min_element(std::begin(told), std::end(told), is_older);
   } else if (now - entry->when < kPause) {
     return false;
