@@ -41,8 +41,9 @@ string(TOUPPER ${name} title)
 execute_process(COMMAND ${LOWDOWN} -s -Tman -m "title: ${title}" -m "section: ${section}" ${OUT}.md
                 OUTPUT_VARIABLE made COMMAND_ERROR_IS_FATAL ANY)
 file(REMOVE ${OUT}.md)
-# Headings on the lines of their macros, as programs that index pages expect them, and no stretched lines: newer
-# formatters go back to what AD says at each paragraph.
+# A font that every formatter knows, headings on the lines of their macros, as programs that index pages expect them, and
+# no stretched lines: newer formatters go back to what AD says at each paragraph.
+string(REPLACE "\\fC" "\\f(CR" made "${made}")
 string(REGEX REPLACE "\n\\.(SH|SS)\n" "\n.\\1 " made "${made}")
 string(REGEX REPLACE "\n(\\.TH [^\n]*\n)" "\n\\1.ds AD l\n.ad l\n" made "${made}")
 file(WRITE ${OUT} "'\\\" t\n${made}")

@@ -266,9 +266,13 @@ TEST_F(Quorvelctl, TellsHowTheDaemonIs) {
     EXPECT_EQ(json.find("\"reason\": ") == std::string::npos, status == 0) << json;
   };
   expect_status(3, "daemon     not running. Start quorveld");
+  Program early(daemon_program());
+  ASSERT_TRUE(early.wait_until_ready());
   root.write_file("/etc/quorvel/telephony", "");
   Program simulator(simulator_program());
   ASSERT_TRUE(simulator.wait_for_output("ready"));
+  expect_status(1, "not followed: the daemon may have started before /etc/quorvel/telephony was made");
+  early.stop();
   Program daemon(daemon_program());
   ASSERT_TRUE(daemon.wait_until_ready());
   EXPECT_TRUE(eventually([] { return run_to_end(control_program(), {"status"}).status == 0; }));

@@ -35,7 +35,7 @@ void put_server(PropertyValue& facts, const Server& server) {
 bool is_foreign(const Server& service) { return service.state == Server::State::serving && !is_believed(service); }
 
 // Why the daemon does not follow the service that is there or should be, as far as one sees from outside.
-std::string why_not_followed(const Server& service, bool marked) {
+std::string why_not_followed(const Server& service, const Server& daemon) {
   if (service.state == Server::State::absent) {
     struct stat socket {};
     return exists(paths::kTelephonySocket, &socket)
@@ -44,9 +44,12 @@ std::string why_not_followed(const Server& service, bool marked) {
   }
   if (is_foreign(service))
     return "it is served by " + name_of(service) + ", which is neither root nor the owner of /run/quorvel";
-  if (!marked)
+  struct stat mark {};
+  if (!exists(paths::kTelephonyMark, &mark))
     return std::string("the daemon may have started without it: make ") + paths::kTelephonyMark +
            " and restart the daemon";
+  if (static_cast<double>(mark.st_ctim.tv_sec) >= start_of(daemon.process).value_or(0))
+    return std::string("the daemon may have started before ") + paths::kTelephonyMark + " was made: restart the daemon";
   return is_installed_system() ? "the daemon says why with: journalctl -u quorveld"
                                : "the daemon says why on its standard error";
 }
@@ -123,7 +126,7 @@ Finding check_telephony(const Server& daemon) {
     finding.reason = "only root and the daemon's user can see whether it is";
     finding.lines.push_back("followed or not: " + finding.reason);
   } else {
-    find_ill(finding, daemon.process > 0 ? why_not_followed(service, marked) : "the daemon does not run",
+    find_ill(finding, daemon.process > 0 ? why_not_followed(service, daemon) : "the daemon does not run",
              "not followed: ");
   }
   if (service.state != Server::State::serving) return finding;
