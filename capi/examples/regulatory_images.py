@@ -14,6 +14,7 @@ class Error(ctypes.Structure):
 
 for function in ("quorvel_client_new", "quorvel_call_start"):
     getattr(quorvel, function).restype = ctypes.c_void_p
+quorvel.quorvel_dictionary_next.restype = ctypes.c_bool  # of which only one byte counts
 client = ctypes.c_void_p(quorvel.quorvel_client_new())
 operation = b"copyRegulatoryImagesWithCompletionBlock:"
 error, images = Error(), ctypes.c_void_p()
