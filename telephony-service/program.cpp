@@ -6,6 +6,7 @@
 #include <csignal>
 #include <cstdio>
 #include <cstring>
+#include <iostream>
 #include <memory>
 #include <new>
 #include <optional>
@@ -26,6 +27,15 @@ namespace quorvel::telephony {
 
 using tools::Failure;
 
+namespace {
+
+void finish_output() {
+  if (std::cout.flush()) return;
+  throw Failure{kSystemError, std::string("cannot write to standard output: ") + std::strerror(errno)};
+}
+
+}  // namespace
+
 CallWords::CallWords(const tools::CommandWords& words)
     : app_(std::make_unique<CLI::App>(tools::description_of(words), words.name)) {
   app_->formatter(std::make_shared<tools::HelpFormatter>());
@@ -38,7 +48,8 @@ CallWords::~CallWords() = default;
 bool CallWords::take(int count, char** words) {
   app_->set_version_flag("--version", app_->get_name() + " " QUORVEL_VERSION, "Print the version and end");
   if (const std::optional<std::string> answer = tools::answer_for_tools(*app_, count, words, {})) {
-    std::fputs(answer->c_str(), stdout);
+    std::cout << *answer;
+    finish_output();
     return false;
   }
   try {
@@ -46,6 +57,7 @@ bool CallWords::take(int count, char** words) {
   } catch (const CLI::ParseError& error) {
     if (error.get_exit_code() != 0) throw Failure{kUsage, tools::complaint(*app_, error)};
     app_->exit(error);
+    finish_output();
     return false;
   }
   tools::use_device_root(tools::is_given(*app_, "--root") ? std::optional(root_) : std::nullopt, kConfiguration);

@@ -174,7 +174,6 @@ TEST_F(Quorvelctl, LeavesNothingBehindWhenAFileCannotBeWritten) {
   const std::string folder = "/private/var/mobile/Library/Preferences";
   root.write_plist(folder + "/com.example.plist", dictionary({}));
   const std::string file = root.path(folder + "/com.example.plist");
-  std::signal(SIGXFSZ, SIG_IGN);
   const rlimit little = {64, RLIM_INFINITY};
   ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
   const std::string large = "[0,1,2,3,4,5,6,7,8,9]";  // larger as a property list

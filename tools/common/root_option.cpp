@@ -1,6 +1,7 @@
 #include "root_option.h"
 
 #include <fcntl.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdlib>
@@ -28,8 +29,13 @@ void use_device_root(const std::optional<std::string>& directory, int status) {
     }
   }
   if (Descriptor(platform::open_file("/", O_PATH | O_DIRECTORY, 0))) return;
-  if (errno == ENOSYS) throw Failure{directory ? status : kBadConfiguration, "A device root needs Linux 5.6 or later"};
-  const std::string reason = std::strerror(errno);
+  const int error = errno;
+  if (error == ENOSYS) throw Failure{directory ? status : kBadConfiguration, "A device root needs Linux 5.6 or later"};
+  // Every path in a device root is checked through /proc, which may be what is missing.
+  if (::access("/proc/self/fd", X_OK) != 0) {
+    throw Failure{directory ? status : kBadConfiguration, "A device root needs /proc, which cannot be used"};
+  }
+  const std::string reason = std::strerror(error);
   if (directory) {
     throw Failure{status, "--root \"" + *directory + "\": " + reason +
                               ". Make a device root with: quorvelctl root create " + *directory};

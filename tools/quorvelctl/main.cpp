@@ -1,3 +1,4 @@
+#include <csignal>
 #include <memory>
 #include <new>
 #include <optional>
@@ -78,6 +79,8 @@ int parse_and_run(int count, char** words) {
 }  // namespace quorvel::tools
 
 int main(int count, char** words) {
+  // A file that reaches its size limit is an error to be told, and what was written of it is removed.
+  std::signal(SIGXFSZ, SIG_IGN);
   try {
     return quorvel::tools::parse_and_run(count, words);
   } catch (const quorvel::tools::Failure& failure) {

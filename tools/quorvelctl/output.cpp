@@ -1,5 +1,6 @@
 #include "output.h"
 
+#include <poll.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -20,6 +21,10 @@ void write_output(std::string_view text) {
     const ssize_t written = ::write(STDOUT_FILENO, text.data(), text.size());
     if (written >= 0) {
       text.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno == EAGAIN) {
+      // Another program that has the same pipe or terminal may have set it not to wait.
+      pollfd room = {STDOUT_FILENO, POLLOUT, 0};
+      ::poll(&room, 1, -1);
     } else if (errno != EINTR) {
       throw Failure{kUnreachable, std::string("cannot write to standard output: ") + std::strerror(errno)};
     }
