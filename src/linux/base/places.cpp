@@ -6,6 +6,17 @@
 
 namespace quorvel::platform::host {
 
+namespace {
+
+// A user with more connections than this gets less room in the kernel for unread bytes on the others: no program needs
+// so many, and each could leave them unread. So does everybody who comes when all together have more than a device has
+// programs, because one person may be many users. The kernel doubles the number.
+constexpr std::size_t kOrdinaryConnections = 16;
+constexpr std::size_t kOrdinaryCrowd = 256;
+constexpr int kSmallSendRoom = 4096;
+
+}  // namespace
+
 Peer peer_of(int socket) noexcept {
   ucred credentials = {};
   socklen_t size = sizeof credentials;
@@ -43,6 +54,11 @@ void Places::give_back(uid_t user) noexcept {
   if (share == nullptr) return;
   count_.fetch_sub(1, std::memory_order_relaxed);
   if (--share->connections == 0) *share = users_[--user_count_];
+}
+
+void Places::bound_send_room(int socket, std::size_t held) const noexcept {
+  if (held <= kOrdinaryConnections && count_.load(std::memory_order_relaxed) <= kOrdinaryCrowd) return;
+  ::setsockopt(socket, SOL_SOCKET, SO_SNDBUF, &kSmallSendRoom, sizeof kSmallSendRoom);
 }
 
 void Places::hold(uid_t user, std::size_t before, std::size_t now) noexcept {

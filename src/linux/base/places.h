@@ -42,6 +42,9 @@ class Places {
   /// Takes a place back that `take` gave; its connection holds no bytes any more.
   void give_back(uid_t user) noexcept;
 
+  /// Bounds what the kernel keeps for a connection that does not read: the one with which its user holds `held` places.
+  void bound_send_room(int socket, std::size_t held) const noexcept;
+
   /// True while there are more connections than there may be.
   [[nodiscard]] bool are_overfull() const noexcept { return count_.load(std::memory_order_relaxed) > limit_(); }
   /// True while one more may be let in before somebody else has given way, for whom the reserve of descriptors

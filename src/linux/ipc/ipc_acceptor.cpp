@@ -1,7 +1,5 @@
 #include "linux/ipc/ipc_acceptor.h"
 
-#include <sys/socket.h>
-
 #include <cerrno>
 #include <memory>
 #include <new>
@@ -14,11 +12,6 @@
 namespace quorvel::platform::host {
 
 namespace {
-
-// A user with more connections than this gets less room in the kernel for unread replies on the others: no program
-// needs so many, and each could leave a reply unread. The kernel doubles the number.
-constexpr std::size_t kOrdinaryConnections = 16;
-constexpr int kSmallSendRoom = 4096;
 
 constexpr int kAcceptsAtOnce = 16;
 
@@ -66,9 +59,7 @@ bool IpcAcceptor::introduce(Descriptor socket) noexcept {
     listener_->places().give_back(connection->peer().user);
     return true;
   }
-  if (held > kOrdinaryConnections) {
-    ::setsockopt(connection->descriptor(), SOL_SOCKET, SO_SNDBUF, &kSmallSendRoom, sizeof kSmallSendRoom);
-  }
+  listener_->places().bound_send_room(connection->descriptor(), held);
   IpcWorker& least_loaded = listener_->least_loaded();
   // The kernel wakes the same thread again and again while that has time to accept, so the balance is struck here.
   if (worker_.connection_count() > least_loaded.connection_count()) {

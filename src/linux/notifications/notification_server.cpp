@@ -155,10 +155,12 @@ void NotificationServer::make_room() noexcept {
 bool NotificationServer::take_in(Descriptor socket) noexcept {
   auto* observer = new (std::nothrow) NotificationObserver(std::move(socket), served_);
   if (observer == nullptr) return false;
-  if (places_.take(observer->user()) == 0) {
+  const std::size_t held = places_.take(observer->user());
+  if (held == 0) {
     delete observer;
     return false;
   }
+  places_.bound_send_room(observer->descriptor(), held);
   if (!queue_.add(observer->descriptor(), 0, observer)) {
     places_.give_back(observer->user());
     delete observer;
