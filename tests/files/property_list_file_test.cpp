@@ -105,6 +105,9 @@ TEST_F(PropertyListFile, ALoadThatFailsSaysWhy) {
   rusage used{};
   ASSERT_EQ(::getrusage(RUSAGE_SELF, &used), 0);
   EXPECT_LT(used.ru_maxrss, 1 << 19) << "its first and last bytes are enough";
+  const PropertyValue large = test::dictionary({{"large", test::data(std::string((64u << 20) + 1, 'x'))}});
+  root.write_plist(kFile, large);
+  EXPECT_TRUE(load_dict(kFile.c_str()) == large);
   std::filesystem::resize_file(root.path(kFile), 0x7ffff001);
   EXPECT_FALSE(load_mutable_dict(kFile.c_str()));
   root.expect_log({"_load_dict: too big for our purposes"});

@@ -208,6 +208,13 @@ TEST(Binary, BoundsHoldForReaderAndWriterAlike) {
   EXPECT_FALSE(write_binary(nested(kMaximumDepth + 1), out));
   EXPECT_FALSE(write_binary(nested(1'000'000), out));
   EXPECT_EQ(out.size(), size);
+  std::string deep = encoded(dictionary({{"a", nested(kMaximumDepth - 1)}}));
+  EXPECT_TRUE(passes_check(deep) && decoded(deep));
+  char& deepest =
+      deep[static_cast<unsigned char>(deep[deep.size() - 2]) * 256u + static_cast<unsigned char>(deep.back()) - 1];
+  ASSERT_EQ(deepest, '\x09');
+  deepest = '\xa0';  // an empty array
+  EXPECT_FALSE(passes_check(deep) || decoded(deep));
 
   PropertyValue fan = array({true});
   for (int i = 0; i < 30; ++i) fan = array({fan, fan});
