@@ -166,6 +166,8 @@ TEST_F(ModemManager, DaemonsFollowALifeOfAModem) {
   std::optional<Program> recorder;
   // A bridge that has not reached the bus yet tells so first.
   ASSERT_TRUE(eventually([&] {
+    recorder.reset();
+    std::filesystem::remove(recorded);
     recorder.emplace(control_program(), ProgramOptions{.arguments = {"sim", "record", recorded}, .input = {}});
     return eventually([&] { return std::filesystem::exists(recorded) && !steps_recorded(recorded).empty(); }) &&
            steps_recorded(recorded).front() == steps_recorded(kRecording).front();

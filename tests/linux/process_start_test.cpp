@@ -1,6 +1,7 @@
 // What must hold before the daemon logs its first line, what keeps it from starting, and its notification center.
 #include <sched.h>
 #include <sys/file.h>
+#include <sys/ioctl.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -281,6 +282,18 @@ TEST_F(NotificationCenter, ASlowObserverIsToldHowManyItMissed) {
   }
   SocketPeer late = observer();
   EXPECT_EQ(late.receive()->serial, count);
+}
+
+TEST_F(NotificationCenter, AUserOfManyObserversHasLittleRoomForMoreOfThem) {
+  std::vector<SocketPeer> peers;
+  while (peers.size() < 17) ASSERT_TRUE(peers.emplace_back(observer()).receive());
+  for (int i = 0; i < 1000; ++i) post_notification(text("name"), text(std::string(1000, 'o')));
+  const auto unread = [](const SocketPeer& peer) {
+    int bytes = 0;
+    return ::ioctl(peer.descriptor(), FIONREAD, &bytes) == 0 ? bytes : -1;
+  };
+  EXPECT_TRUE(eventually([&] { return unread(peers.front()) > 50'000; })) << unread(peers.front());
+  EXPECT_LT(unread(peers.back()), 16'000);
 }
 
 // Keeps the center's thread from running while the calling one does: both have one processor, and where it is allowed
