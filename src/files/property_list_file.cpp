@@ -14,15 +14,13 @@
 #include "platform/lock.h"
 #include "property/binary/binary.h"
 #include "property/binary/layout.h"
+#include "property/limits.h"
 
 namespace quorvel {
 namespace {
 
 constexpr const char* kStore = "store_dict";
 constexpr const char* kLoad = "_load_dict";
-
-// A read delivers no more than this, so a larger file can never be read whole.
-constexpr off_t kLargestRead = 0x7ffff000;
 
 // Files above this size are loaded one at a time, so that many requests for a huge one cannot use up the memory.
 constexpr off_t kLargeFile = off_t{64} << 20;
@@ -151,7 +149,7 @@ PropertyValue load(const char* path, Mutability mutability, CheckedBytes* checke
   }
   struct stat status;
   if (!ask_status(file, path, status)) return {};
-  if (status.st_size > kLargestRead) {
+  if (status.st_size > kLargestFile) {
     daemon_log(0, kLoad, "too big for our purposes");
     return {};
   }

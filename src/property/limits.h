@@ -3,8 +3,12 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 
 namespace quorvel {
+
+/// The size in bytes of the largest file that can be read whole, because a read delivers no more.
+inline constexpr std::int64_t kLargestFile = 0x7ffff000;
 
 /// How many containers may lie within each other.
 inline constexpr std::size_t kMaximumDepth = 512;

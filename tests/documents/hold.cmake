@@ -99,7 +99,7 @@ set(figures
   "kFull = 256@docs/property-list.md@looks up 256 values"
   "kUnindexed = 8@docs/memory-layout.md@Up to 8 entries"
   "kLiveAnswers.size() == 97)@docs/data-ark.md@the 97 rows of"
-  "kLargestRead = 0x7ffff000@docs/property-list.md@up to 0x7ffff000 bytes"
+  "kLargestFile = 0x7ffff000@docs/property-list.md@up to 0x7ffff000 bytes"
   "kRotationThreshold = 1'048'576@docs/files.md@each up to 1 MiB"
   "kInterval = 60@docs/architecture.md@once a minute at most"
   "kQuiet = std::chrono::milliseconds(250)@docs/modem-bridge.md@quiet time of 250 ms"

@@ -13,14 +13,12 @@
 #include "platform/descriptor.h"
 #include "platform/file_system.h"
 #include "property/binary/binary.h"
+#include "property/limits.h"
 
 namespace quorvel::tools {
 namespace {
 
 constexpr std::size_t kReadSize = 64u << 10;
-
-// The daemon loads no larger file, because no read delivers more.
-constexpr off_t kLargestPlist = 0x7ffff000;
 
 }  // namespace
 
@@ -54,7 +52,7 @@ std::optional<PropertyValue> read_device_plist(const std::string& path, Links li
   struct stat status {};
   if (::fstat(file.get(), &status) != 0) fail_on("read", path);
   if (!S_ISREG(status.st_mode)) throw Failure{kUnreachable, path + " is not a file; move it out of the way"};
-  if (status.st_size > kLargestPlist) throw Failure{kUnreachable, path + " is too large for a property list"};
+  if (status.st_size > kLargestFile) throw Failure{kUnreachable, path + " is too large for a property list"};
   return parse_plist(read_all(file.get(), path), path, consequence);
 }
 
